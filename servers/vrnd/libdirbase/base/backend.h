@@ -1,0 +1,31 @@
+// The record of one data store of the server, and the list of them.
+//
+// The front end fills the records and the list before other threads read them; neither changes after that.
+#pragma once
+
+#include "libraries/dirbase_export.h"
+
+// Members are added as the library comes to need them, in their order. Texts and functions belong to whoever fills the
+// record; a function pointer may be null.
+struct Backend {
+    const char* be_type;  // "rdbm" for the relational store, "proxy", "ldcf" for the schema store
+    Backend* be_next;     // next on the list
+
+    // What stands in front of the names of a relational store's tables, for example their owner, and the table that holds
+    // entry-level attributes. The texts stay with the back end.
+    const char* (*be_table_qualifier)(Backend* be);
+    const char* (*be_entry_table)(Backend* be);
+};
+
+extern "C" {
+
+// Head of the list.
+DIRBASE_EXPORT extern Backend* g_backends;
+
+// The kind of server: 1 for one without tables, 2, the value at start, for one with a relational back end.
+DIRBASE_EXPORT extern int g_srvType;
+
+// The first back end of a list whose type is `type`, without regard to case; null when there is none or type is null.
+DIRBASE_EXPORT Backend* ldcf_api_get_backend(Backend* head, const char* type);
+
+}  // extern "C"

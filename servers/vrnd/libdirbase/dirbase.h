@@ -1,0 +1,21 @@
+// The public headers of libdirbase: what a caller, a plug-in or a test from outside includes first.
+#pragma once
+
+#include "servers/vrnd/libcsgl/csgl_exception.h"
+#include "servers/vrnd/libcsgl/csgl_file.h"
+#include "servers/vrnd/libcsgl/csgl_memory.h"
+#include "servers/vrnd/libcsgl/csgl_message.h"
+#include "servers/vrnd/libcsgl/csgl_output.h"
+#include "servers/vrnd/libcsgl/csgl_refcounted.h"
+#include "servers/vrnd/libcsgl/csgl_string.h"
+#include "servers/vrnd/libdirbase/base/backend.h"
+#include "servers/vrnd/libdirbase/locking/rdbm_lock.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_attrtype.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_matchrule.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_objclass.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_rdbm.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_schema_modify.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_stream.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_syntax.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_token.h"

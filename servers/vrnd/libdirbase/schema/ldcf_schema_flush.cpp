@@ -1,0 +1,150 @@
+// The way of a changed schema to disk: a temporary file beside each modified file, then one in the place of the other.
+#include <unistd.h>
+
+#include <cerrno>
+#include <exception>
+
+#include "libraries/libmsg/debug_log.h"
+#include "servers/vrnd/libcsgl/csgl_file.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
+
+namespace {
+
+csgl_string temporary_of(const csgl_string& file)
+{
+    return file + file_suffix;
+}
+
+// Writes one section: the text of each definition that is at home in a file, a line each.
+template <typename Map, typename Text, typename AtHome>
+void write_section(csgl_output& output, const char* keyword, const Map& map, Text&& text, AtHome&& at_home)
+{
+    output << keyword << " {\n";
+    ldcf_for_each_definition(map, [&](const auto& definition) {
+        if (at_home(definition)) {
+            output << text(definition) << "\n";
+        }
+    });
+    output << "}\n\n";
+}
+
+void remove_if_there(const csgl_string& file)
+{
+    try {
+        csgl_file::remove(file);
+    } catch (const exc_does_not_exist_t&) {
+        // That nothing stands there is what was wanted.
+    }
+}
+
+// The old content of one schema file, kept under a second name while the new content takes its place. Unless the change is
+// kept, the destructor puts it back.
+class replaced_file {
+public:
+    explicit replaced_file(const csgl_string& file) : file_(file), backup_(file + ".old")
+    {
+        remove_if_there(backup_);
+        existed_ = csgl_file::exists(file_);
+        if (existed_ && ::link(file_, backup_) != 0) {
+            exc_t::throw_posix_error(__FILE__, __LINE__, errno);
+        }
+    }
+    replaced_file(replaced_file&& other) noexcept
+        : file_(other.file_), backup_(other.backup_), existed_(other.existed_), settled_(other.settled_)
+    {
+        other.settled_ = true;
+    }
+    ~replaced_file()
+    {
+        if (settled_) {
+            return;
+        }
+        const int failed = existed_ ? ::rename(backup_, file_) : ::unlink(file_);
+        if (failed != 0 && errno != ENOENT) {
+            debug_error("Error - ldcf_schema: %s could not be put back, errno %d\n", file_.c_str(), errno);
+        }
+    }
+
+    void take_new_content() { csgl_file::rename(temporary_of(file_), file_, csgl_file_force); }
+
+    // The new content stays.
+    void keep() noexcept
+    {
+        settled_ = true;
+        if (existed_ && ::unlink(backup_) != 0) {
+            debug_error("Error - ldcf_schema: %s could not be removed, errno %d\n", backup_.c_str(), errno);
+        }
+    }
+
+private:
+    csgl_string file_;
+    csgl_string backup_;
+    bool existed_ = false;
+    bool settled_ = false;
+};
+
+}  // namespace
+
+void ldcf_schema::flush() const
+{
+    for (const auto& [file, state] : files) {
+        if (state == modified_indicator::modified) {
+            flush(file);
+        }
+    }
+}
+
+void ldcf_schema::flush(const csgl_string& file) const
+{
+    csgl_output_file output(temporary_of(file), csgl_output_truncate);
+    const auto standard = [](const auto& definition) { return definition.v3_string().c_str(); };
+    const auto at_home = [&](const auto& definition) { return definition->v3_file() == file; };
+
+    write_section(output, "objectClasses", object_classes, standard, at_home);
+    write_section(output, "attributeTypes", attribute_types, standard, at_home);
+    write_section(
+        output, "XANattributeTypes", attribute_types,
+        [](const ldcf_attrtype& attribute) { return attribute.xan_string().c_str(); },
+        [&](const ldcf_attrtype& attribute) {
+            return attribute->xan_file() == file ||
+                   (attribute->has_extended() && attribute->xan_file().empty() && attribute->v3_file() == file);
+        });
+    write_section(output, "ldapSyntaxes", syntaxes, standard, at_home);
+    write_section(output, "matchingRules", matching_rules, standard, at_home);
+    output.flush_to_disk();
+}
+
+void ldcf_schema::flush_commit()
+{
+    csgl_vector<replaced_file> replaced;
+    for (const auto& [file, state] : files) {
+        if (state == modified_indicator::modified) {
+            replaced.emplace_back(file);
+            replaced.back().take_new_content();
+        }
+    }
+    for (replaced_file& done : replaced) {
+        done.keep();
+    }
+    for (auto& [file, state] : files) {
+        state = modified_indicator::flushed;
+    }
+}
+
+void ldcf_schema::flush_rollback()
+{
+    std::exception_ptr first_failure;
+    for (auto& [file, state] : files) {
+        if (state == modified_indicator::modified) {
+            state = modified_indicator::flushed;
+            try {
+                remove_if_there(temporary_of(file));
+            } catch (const exc_t&) {
+                first_failure = first_failure ? first_failure : std::current_exception();
+            }
+        }
+    }
+    if (first_failure) {
+        std::rethrow_exception(first_failure);
+    }
+}
