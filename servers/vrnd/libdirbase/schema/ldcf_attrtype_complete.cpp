@@ -191,15 +191,17 @@ ldcf_matchrule ldcf_attrtype_::resolve_rule(const char* keyword, const csgl_stri
 void ldcf_attrtype_::check_encryption()
 {
     const bool encrypted = encryption_ != ldcf_encryption::none;
+    bool plain_syntax = false;
     for (const char* syntax_oid : never_encrypted_syntaxes) {
-        if (syntax_oid_ == syntax_oid) {
-            may_be_encrypted_ = false;
-        }
+        plain_syntax = plain_syntax || syntax_oid_ == syntax_oid;
     }
-    if (encrypted && !may_be_encrypted_) {
-        LDCF_THROW_INPUT(("Attribute ", ldcf_quoted_parameter(primary_name_), " cannot be encypted.  Syntax ",
-                          ldcf_quoted_parameter(syntax_oid_), " is not allowed to be encrypted."),
-                         LDCF_MSG_ENCRYPTED_SYNTAX);
+    if (plain_syntax) {
+        may_be_encrypted_ = false;
+        if (encrypted) {
+            LDCF_THROW_INPUT(("Attribute ", ldcf_quoted_parameter(primary_name_), " cannot be encypted.  Syntax ",
+                              ldcf_quoted_parameter(syntax_oid_), " is not allowed to be encrypted."),
+                             LDCF_MSG_ENCRYPTED_SYNTAX);
+        }
     }
 
     bool special = attr_class() != ldcf_attr_class_user || attr_id() == attr_id_cn || attr_id() == attr_id_objectclass;
@@ -247,9 +249,7 @@ void ldcf_attrtype_::incomplete()
     substr_rule_ = ldcf_matchrule();
     supertype_ = ldcf_attrtype();
     effective_length_ = 0;
-    if (inherited_asked_.raised()) {
-        v3_string_inherited_.clear();
-    }
+    v3_string_inherited_.clear();
     inherited_asked_.clear();
     table_ = csgl_string();
     column_ = csgl_string();

@@ -14,6 +14,7 @@ namespace {
 
 constexpr unsigned table_name_limit = 128;
 constexpr unsigned hash_suffix_length = 7;
+constexpr std::uint32_t hash_slots = 7001;
 constexpr unsigned column_name_limit = 17;
 constexpr unsigned cut_column_length = 16;
 constexpr int access_class_system = 4;
@@ -46,7 +47,8 @@ csgl_string store_form(const csgl_string& name)
     return {text.get(), length};
 }
 
-// The hash of ELF symbol tables over the name in upper case, with bytes taken as signed.
+// The slot of a name in a table of 7001: the hash of ELF symbol tables over the name in upper case, with bytes taken as
+// signed.
 std::uint64_t hash_name(const csgl_string& name)
 {
     std::uint32_t h = 0;
@@ -60,7 +62,7 @@ std::uint64_t hash_name(const csgl_string& name)
         }
         h &= ~g;
     }
-    return h;
+    return h % hash_slots;
 }
 
 csgl_string cut_generated_name(const csgl_string& name)
