@@ -101,6 +101,14 @@ bool same_file(const struct stat& a, const struct stat& b)
     return a.st_dev == b.st_dev && a.st_ino == b.st_ino;
 }
 
+// True when both paths lead to one file, by whatever links.
+bool lead_to_one_file(const char* a, const char* b)
+{
+    struct stat a_stat {};
+    struct stat b_stat {};
+    return ::stat(a, &a_stat) == 0 && ::stat(b, &b_stat) == 0 && same_file(a_stat, b_stat);
+}
+
 bool same_directory(const char* a, const char* b)
 {
     const std::string_view a_name = base_name(a);
@@ -151,7 +159,7 @@ csgl_file::~csgl_file()
 
 int csgl_file::duplicate_handle(int handle)
 {
-    return checked(::dup(handle), __LINE__);
+    return checked(::fcntl(handle, F_DUPFD_CLOEXEC, 0), __LINE__);
 }
 
 unsigned csgl_file::size() const
@@ -207,6 +215,9 @@ csgl_file::timestamp csgl_file::get_last_mod_time() const
 
 csgl_string csgl_file::canonize(const char* path)
 {
+    if (path == nullptr) {
+        throw exc_assertion_failed_t(__FILE__, __LINE__, "unexpected null pointer", 0);
+    }
     if (*path == '/') {
         return path;
     }
@@ -230,6 +241,9 @@ void csgl_file::copy(const char* from, const char* to)
 void csgl_file::copy(const char* from, const char* to, force_indicator)
 {
     csgl_file source(from, csgl_file_open_existing, csgl_file_read, csgl_file_deny_none);
+    if (lead_to_one_file(from, to)) {
+        return;  // opening the target would empty the source
+    }
     csgl_file target(to, csgl_file_empty_or_create, csgl_file_write, csgl_file_deny_none);
     csgl_local_array_of<char> buffer(copy_size);
     while (const unsigned count = source.read(buffer.get(), copy_size)) {
@@ -253,6 +267,8 @@ void csgl_file::rename(const char* from, const char* to, force_indicator)
         case two_names::of_one_file: remove(from); return;
         case two_names::of_two_files: break;
         }
+        struct stat status {};
+        checked(::lstat(from, &status), __LINE__);  // without a source the target isn't touched
         remove(to);
     }
     checked(::link(from, to), __LINE__);

@@ -105,7 +105,7 @@ public:
     static csgl_string canonize(const char* path);
 
     // Copies a file. The first form refuses an existing target (exc_already_exists_t). A failed copy leaves a partly
-    // written target.
+    // written target. A file copied onto itself stays as it is.
     static void copy(const char* from, const char* to);
     static void copy(const char* from, const char* to, force_indicator force);
 

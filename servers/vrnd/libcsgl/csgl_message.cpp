@@ -3,6 +3,7 @@
 
 #include <cstring>
 #include <string_view>
+#include <utility>
 
 #include "libraries/libmsg/message_log.h"
 #include "servers/vrnd/libcsgl/csgl_string.h"
@@ -77,8 +78,8 @@ int csgl_get_catid(int id)
 int csgl_get_msgid(int id)
 {
     const unsigned v = magnitude(id);
-    const auto number = static_cast<int>((v & has_catalogue) != 0 ? v & 0xffff : v);
-    return id < 0 ? -number : number;
+    const unsigned number = (v & has_catalogue) != 0 ? v & 0xffff : v;
+    return static_cast<int>(id < 0 ? 0u - number : number);
 }
 
 csgl_message_::~csgl_message_()
@@ -105,6 +106,7 @@ void csgl_message_::init(const char* text, unsigned length, int number, const ch
 
 bool csgl_message_::try_init(const char* text, unsigned length, int number, const char* file, int line) noexcept
 {
+    csgl_free(std::exchange(text_, nullptr));
     number_ = number;
     file_ = file;
     line_ = line;
@@ -184,8 +186,9 @@ void csgl_message_::log(int severity, int catalogue)
     }
     const auto& p = parameters_;
     if (number_ < 0) {
-        PrintMessage(catalogue, severity, -number_, p[0], p[1], p[2], p[3], p[4], p[5], p[6], p[7], p[8], p[9]);
-        getPrintedMessage(printed_, block_size_ / 2, catalogue, severity, -number_, p[0], p[1], p[2], p[3], p[4], p[5],
+        const auto id = static_cast<int>(magnitude(number_));
+        PrintMessage(catalogue, severity, id, p[0], p[1], p[2], p[3], p[4], p[5], p[6], p[7], p[8], p[9]);
+        getPrintedMessage(printed_, block_size_ / 2, catalogue, severity, id, p[0], p[1], p[2], p[3], p[4], p[5],
                           p[6], p[7], p[8], p[9]);
         return;
     }

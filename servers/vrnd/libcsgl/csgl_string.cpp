@@ -209,6 +209,12 @@ csgl_string operator+(const char* a, const csgl_string& b)
 int csgl_str_ci_compare(const char* a, const char* b)
 {
     for (;; ++a, ++b) {
+        if (*a == *b) {  // most bytes of most names, without asking the locale
+            if (*a == '\0') {
+                return 0;
+            }
+            continue;
+        }
         const auto left = static_cast<signed char>(std::tolower(static_cast<unsigned char>(*a)));
         const auto right = static_cast<signed char>(std::tolower(static_cast<unsigned char>(*b)));
         if (left != right || *a == '\0') {

@@ -59,6 +59,11 @@ public:
     // A new body with at most `length` bytes of a text.
     csgl_string(const char* text, unsigned length);
 
+    // Copies share the body. There is no move: a string always has a text.
+    csgl_string(const csgl_string&) = default;
+    csgl_string& operator=(const csgl_string&) = default;
+    ~csgl_string() = default;
+
     const char* c_str() const { return get()->text(); }
     operator const char*() const { return c_str(); }
     unsigned length() const { return get()->length(); }
@@ -87,11 +92,17 @@ public:
     }
     friend bool operator==(const csgl_string& a, const char* b) { return compare(a.c_str(), b) == 0; }
     friend bool operator<(const csgl_string& a, const csgl_string& b) { return compare(a.c_str(), b.c_str()) < 0; }
+    friend bool operator>(const csgl_string& a, const csgl_string& b) { return b < a; }
+    friend bool operator<=(const csgl_string& a, const csgl_string& b) { return !(b < a); }
+    friend bool operator>=(const csgl_string& a, const csgl_string& b) { return !(a < b); }
 
     // A new text; neither operand changes, and a null text counts as empty.
     friend DIRBASE_EXPORT csgl_string operator+(const csgl_string& a, const csgl_string& b);
     friend DIRBASE_EXPORT csgl_string operator+(const csgl_string& a, const char* b);
     friend DIRBASE_EXPORT csgl_string operator+(const char* a, const csgl_string& b);
+
+    // Would otherwise step along the text behind the conversion to const char*.
+    friend csgl_string operator+(const csgl_string& a, int b) = delete;
 
 private:
     csgl_string(const char* text1, unsigned length1, const char* text2, unsigned length2);

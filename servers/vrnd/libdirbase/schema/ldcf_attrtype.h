@@ -79,7 +79,7 @@ public:
     using csgl_refcounted_pointer_to::csgl_refcounted_pointer_to;
 
     // Reads one standard definition: a new type, the other half of a type whose extended definition was read before, or an
-    // alternate definition of a type of the same source, which must agree with it in all but its names and adds these.
+    // alternate definition of a type of the same source, which must agree with it in all but its names and adds these (a type without a name takes the primary one).
     // Raises the exceptions of the token layer and exc_invalid_state_t for a type that is being completed or complete. A
     // failure enters nothing in the map, but may leave a type that was found there partly filled.
     static void parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_attrtype>& map);
@@ -222,7 +222,7 @@ private:
     void finish_completion(const rule_map& rules, const syntax_map& syntaxes);
     void inherit();
     void resolve_syntax(const syntax_map& syntaxes);
-    ldcf_matchrule resolve_rule(const char* keyword, const csgl_string& rule, const rule_map& rules) const;
+    ldcf_matchrule resolve_rule(const char* keyword, csgl_string& rule, const rule_map& rules) const;
     void check_encryption();
     void append_store_form(csgl_string& text) const;
 

@@ -43,6 +43,15 @@ int default_length_of(const csgl_string& syntax_oid)
     return length_of_other_syntaxes;
 }
 
+// Lets a reference share the text of the definition that it found, when it says the same to the letter: thousands of types
+// name the same few rules and syntaxes.
+void share_text(csgl_string& reference, const csgl_string& found)
+{
+    if (reference == found) {
+        reference = found;
+    }
+}
+
 const csgl_string& name_or_oid(const ldcf_attrtype_& attribute)
 {
     return attribute.name().empty() ? attribute.oid() : attribute.name();
@@ -111,6 +120,7 @@ ldcf_attrtype_* ldcf_attrtype_::link_supertype(const attribute_map& attributes)
                           ldcf_quoted_parameter(primary_name_)),
                          LDCF_MSG_NOT_FOUND);
     }
+    share_text(sup_, found.name());
     supertype_ = found;
     found->subtypes_.insert(ldcf_attrtype(this));
     if (usage_ != found->usage_) {
@@ -170,9 +180,10 @@ void ldcf_attrtype_::resolve_syntax(const syntax_map& syntaxes)
                           ldcf_quoted_parameter(primary_name_)),
                          LDCF_MSG_NOT_FOUND);
     }
+    share_text(syntax_oid_, syntax_.oid());
 }
 
-ldcf_matchrule ldcf_attrtype_::resolve_rule(const char* keyword, const csgl_string& rule, const rule_map& rules) const
+ldcf_matchrule ldcf_attrtype_::resolve_rule(const char* keyword, csgl_string& rule, const rule_map& rules) const
 {
     if (rule.empty()) {
         return {};
@@ -184,6 +195,7 @@ ldcf_matchrule ldcf_attrtype_::resolve_rule(const char* keyword, const csgl_stri
                           ldcf_quoted_parameter(primary_name_)),
                          LDCF_MSG_NOT_FOUND);
     }
+    share_text(rule, found.name());
     return found;
 }
 

@@ -344,6 +344,10 @@ void ldcf_attrtype::parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_
         ldcf_names all_names = found->names_;
         all_names.insert(body.names_.begin(), body.names_.end());
         ldcf_enter(map, oid, body.names_, found);
+        if (found->names_.empty()) {  // was known by its oid only, which is no name that a definition could give
+            found->primary_name_ = body.primary_name_;
+            found->identity_ = body.identity_;
+        }
         found->names_.swap(all_names);
         found->v3_string_.clear();
         return;

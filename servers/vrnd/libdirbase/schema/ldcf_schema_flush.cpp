@@ -38,10 +38,11 @@ void remove_if_there(const csgl_string& file)
 }
 
 // The old content of one schema file, kept under a second name while the new content takes its place. Unless the change is
-// kept, the destructor puts it back.
+// kept, the destructor puts it back. The second name is built on that of the temporary file, which is the server's own, so
+// that no copy of the administrator's is in its way.
 class replaced_file {
 public:
-    explicit replaced_file(const csgl_string& file) : file_(file), backup_(file + ".old")
+    explicit replaced_file(const csgl_string& file) : file_(file), backup_(temporary_of(file) + ".old")
     {
         remove_if_there(backup_);
         existed_ = csgl_file::exists(file_);

@@ -1,0 +1,280 @@
+// The command line of `dirbase`: groups, commands, options, and what becomes of a failure.
+#include <CLI/CLI.hpp>
+#include <functional>
+#include <new>
+#include <sstream>
+
+#include "tools/dirbase/schema_commands.h"
+
+namespace dirbase_tool {
+
+namespace {
+
+// Help is wrapped by hand, since the parser's library doesn't wrap.
+constexpr char exit_statuses[] = R"(
+Exit status: 0 for yes, 1 for findings (the message says what, and where), 2 for a wrong call or input that
+can't be read.)";
+
+constexpr char check_details[] =
+    R"(A syntax error is told as FILE:LINE: TEXT, a fault between definitions as TEXT. What a server would only
+remark on in its log (matching rules that don't suit their syntax, names cut for the store) is told as a
+warning and doesn't change the exit status. Faults and warnings go to standard error.
+)";
+
+constexpr char print_details[] =
+    R"(Without --kind the lines stand in sections as in a schema file. Without --form too, that file is the whole
+schema: the standard definitions, and the extended ones of the attribute types that have them. It loads by
+itself and prints the same again. One thing it can't carry: attribute types count as configuration attributes
+by the name of their file, V3.config.at.
+
+Forms:
+  v3           the standard definitions alone; without --kind a schema file too
+  xan          the extended definitions; without --kind a section of those of attribute types
+  xan-default  the same for all attribute types, defaults filled in, as a server shows them
+  inherited    what the definition in the same line of --form v3 leaves out; this can't be loaded
+)";
+
+constexpr char modify_details[] =
+    R"(The change is made whole or not at all. An added definition goes to the file that is listed last, a replaced
+one stays in its file. A file that changes is written anew from its definitions, without its comments. What
+changed is printed.
+
+FILE holds one definition, in a section as in a schema file. An attribute type may bring its extended
+definition in a second section; without one, replace takes the old one away. For delete only the oid and the
+names count, and names need not be given.
+)";
+
+struct options {
+    common_options common;
+    std::vector<std::string> files;
+    std::string form;
+    std::string kind;
+    std::vector<std::string> names;
+    std::string operation;
+    std::string definition_file;
+};
+
+template <typename Value>
+struct word {
+    const char* text;
+    Value value;
+};
+
+constexpr word<print_form> forms[] = {
+    {"v3", print_form::v3},
+    {"xan", print_form::xan},
+    {"xan-default", print_form::xan_default},
+    {"inherited", print_form::inherited},
+};
+
+constexpr word<print_kind> kinds[] = {
+    {"syntaxes", print_kind::syntaxes},
+    {"matchingrules", print_kind::matching_rules},
+    {"attributetypes", print_kind::attribute_types},
+    {"objectclasses", print_kind::object_classes},
+};
+
+// Accepts the words of a table, in any case.
+template <typename Value, std::size_t count>
+CLI::IsMember one_of(const word<Value> (&words)[count])
+{
+    std::vector<std::string> texts;
+    for (const word<Value>& candidate : words) {
+        texts.emplace_back(candidate.text);
+    }
+    return CLI::IsMember(texts, CLI::ignore_case);
+}
+
+template <typename Value, std::size_t count>
+Value value_of(const std::string& text, const word<Value> (&words)[count], Value otherwise)
+{
+    for (const word<Value>& candidate : words) {
+        if (text == candidate.text) {
+            return candidate.value;
+        }
+    }
+    return otherwise;
+}
+
+using command = std::function<int(message_collector&)>;
+
+void add_flags_of_all(CLI::App& app)
+{
+    app.set_version_flag("--version", "dirbase " DIRBASE_VERSION, "Print the version and exit");
+    app.set_help_flag("-h,--help", "Print this help and exit");
+}
+
+// A word that is followed by another. That one comes is looked at later: the parser would tell a wrong word as a
+// missing one.
+void expect_subcommand(CLI::App& app)
+{
+    app.require_subcommand(0, 1);
+}
+
+CLI::App* add_command(CLI::App& group, const std::string& name, const std::string& description,
+                      const std::string& details, common_options& common)
+{
+    CLI::App* app = group.add_subcommand(name, description);
+    add_flags_of_all(*app);
+    app->footer(details + exit_statuses);
+    app->add_option("--schema", common.schema_folder,
+                    "Directory of schema.list and the files that it names (default: that of\n"
+                    "the environment variable DIRBASE_SCHEMA, else the one that came along)")
+        ->type_name("DIR");
+    app->add_flag("--json", common.as_json,
+                  "Write the result as JSON; a failure is an object too, with \"ok\": false and \"error\"");
+    app->add_flag("-v,--verbose", common.verbosity,
+                  "Show the message log on standard error; given twice, the debug log too");
+    return app;
+}
+
+void add_check(CLI::App& group, options& given, command& chosen)
+{
+    CLI::App* app =
+        add_command(group, "check", "Load the schema and prove that it is whole", check_details, given.common);
+    app->add_option("FILE", given.files, "Schema files to load after those of the directory, - for standard input")
+        ->type_name("");
+    app->callback(
+        [&] { chosen = [&](message_collector& log) { return check_schema(given.common, given.files, log); }; });
+}
+
+void add_print(CLI::App& group, options& given, command& chosen)
+{
+    CLI::App* app =
+        add_command(group, "print", "Print the definitions, one a line, sorted by oid", print_details, given.common);
+    app->add_option("--form", given.form, "What to print of each definition")
+        ->transform(one_of(forms))
+        ->type_name("FORM");
+    app->add_option("--kind", given.kind, "Print the definitions of one kind, without a section around them")
+        ->transform(one_of(kinds))
+        ->type_name("KIND");
+    app->callback([&] {
+        chosen = [&](message_collector&) {
+            return print_schema(given.common, value_of(given.form, forms, print_form::whole),
+                                value_of(given.kind, kinds, print_kind::all));
+        };
+    });
+}
+
+void add_show(CLI::App& group, options& given, command& chosen)
+{
+    CLI::App* app =
+        add_command(group, "show", "Explain definitions: what they say, inherit and come to", "", given.common);
+    app->add_option("NAME", given.names, "Names or oids, in any case, of definitions of any kind")
+        ->type_name("")
+        ->required();
+    app->callback([&] { chosen = [&](message_collector&) { return show_definitions(given.common, given.names); }; });
+}
+
+void add_modify(CLI::App& group, options& given, command& chosen)
+{
+    CLI::App* app = add_command(group, "modify", "Add, delete or replace one definition in the schema files",
+                                modify_details, given.common);
+    app->add_option("OPERATION", given.operation, "What to do")
+        ->check(CLI::IsMember({"add", "delete", "replace"}))
+        ->type_name("")
+        ->required();
+    app->add_option("FILE", given.definition_file, "File of the definition, - for standard input")
+        ->type_name("")
+        ->required();
+    app->callback([&] {
+        chosen = [&](message_collector& log) {
+            return modify_schema(given.common, given.operation, given.definition_file, log);
+        };
+    });
+}
+
+// Tells a failure, to the eyes and with --json to programs, and gives its exit status.
+int report(const tool_failure& failure, bool as_json)
+{
+    tell(failure.message());
+    if (!failure.note().empty()) {
+        tell("note: " + failure.note());
+    }
+    if (as_json) {
+        json error = {{"text", failure.what()}};
+        if (!failure.file().empty()) {
+            error["file"] = failure.file();
+        }
+        if (failure.line() > 0) {
+            error["line"] = failure.line();
+        }
+        if (!failure.note().empty()) {
+            error["note"] = failure.note();
+        }
+        write_json(json{{"ok", false}, {"error", std::move(error)}});
+    }
+    return failure.status();
+}
+
+int run(const command& chosen, const common_options& common)
+{
+    message_collector log(common.verbosity);
+    try {
+        return chosen(log);
+    } catch (const tool_failure& failure) {
+        return report(failure, common.as_json);
+    } catch (const exc_t& failure) {
+        return report(failure_of(failure, common.schema_folder), common.as_json);
+    } catch (const std::bad_alloc&) {
+        return report(tool_failure(status_unusable, "", 0, "not enough memory"), common.as_json);
+    }
+}
+
+// Help and version go to standard output, and faults of the call to standard error.
+int report_call(const CLI::App& app, const CLI::ParseError& outcome)
+{
+    std::ostringstream results;
+    std::ostringstream faults;
+    const int status = app.exit(outcome, results, faults);
+    write_result(results.str());
+    std::istringstream lines(faults.str());
+    for (std::string line; std::getline(lines, line);) {
+        tell(line);
+    }
+    return status == 0 ? status_yes : status_unusable;
+}
+
+int main_of_tool(int argc, char** argv)
+{
+    options given;
+    command chosen;
+
+    CLI::App app("Tools for the data of an LDAP directory server.", "dirbase");
+    add_flags_of_all(app);
+    expect_subcommand(app);
+    CLI::App* schema = app.add_subcommand("schema", "Check, print, explain and change schema files");
+    add_flags_of_all(*schema);
+    expect_subcommand(*schema);
+    add_check(*schema, given, chosen);
+    add_print(*schema, given, chosen);
+    add_show(*schema, given, chosen);
+    add_modify(*schema, given, chosen);
+
+    try {
+        app.parse(argc, argv);
+        if (!chosen) {
+            throw CLI::RequiredError::Subcommand(1);
+        }
+    } catch (const CLI::ParseError& outcome) {
+        return report_call(app, outcome);
+    }
+    return run(chosen, given.common);
+}
+
+}  // namespace
+
+}  // namespace dirbase_tool
+
+int main(int argc, char** argv)
+{
+    try {
+        return dirbase_tool::main_of_tool(argc, argv);
+    } catch (const dirbase_tool::tool_failure& failure) {
+        dirbase_tool::tell(failure.message());  // the report itself couldn't be written
+        return failure.status();
+    } catch (const std::exception& failure) {
+        dirbase_tool::tell(failure.what());
+        return dirbase_tool::status_unusable;
+    }
+}
