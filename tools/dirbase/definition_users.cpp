@@ -1,6 +1,8 @@
 // Who uses a definition: see definition_users.h.
 #include "tools/dirbase/definition_users.h"
 
+#include <algorithm>
+
 #include "tools/dirbase/definition_sheet.h"
 
 namespace dirbase_tool {
@@ -59,12 +61,9 @@ std::vector<std::string> direct_users(const ldcf_attrtype& attribute, const ldcf
     collect_users(users, schema.attribute_types,
                   [&attribute](const ldcf_attrtype& other) { return other->supertype() == attribute; });
     const auto named_in = [&](const ldcf_names& list) {
-        for (const csgl_string& name : list) {
-            if (ldcf_find(schema.attribute_types, name) == attribute) {
-                return true;
-            }
-        }
-        return false;
+        return std::any_of(list.begin(), list.end(), [&](const csgl_string& name) {
+            return ldcf_find(schema.attribute_types, name) == attribute;
+        });
     };
     collect_users(users, schema.object_classes,
                   [&named_in](const ldcf_objclass& user) { return named_in(user->must()) || named_in(user->may()); });

@@ -109,6 +109,7 @@ definition_sheet describe(const ldcf_objclass& objclass, const ldcf_schema& sche
 {
     const std::vector<ldcf_objclass> lineage = lineage_of(objclass, schema);
     std::vector<std::string> superclasses;
+    superclasses.reserve(lineage.size());
     for (const ldcf_objclass& superclass : lineage) {
         superclasses.push_back(text_of(superclass.name()));
     }

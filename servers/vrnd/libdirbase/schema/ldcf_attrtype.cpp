@@ -234,9 +234,17 @@ ldcf_attrtype ldcf_attrtype::clone() const
     return ldcf_attrtype(new ldcf_attrtype_(**this));
 }
 
+// The number and class of a type depend on its home file, too.
+void ldcf_attrtype::v3_file(const csgl_string& file)
+{
+    ldcf_attrtype_& body = **this;
+    body.v3_file_ = file;
+    body.identity_ = ldcf_identify_attribute(file, body.primary_name_, body.usage_);
+}
+
 void ldcf_attrtype::replace(ldcf_attrtype& other)
 {
-    other->v3_file_ = get()->v3_file_;
+    other.v3_file(get()->v3_file_);
     other->xan_file_ = get()->xan_file_;
     **this = *other;
 }

@@ -280,7 +280,6 @@ inline const csgl_string& ldcf_attrtype::name() const { return get()->name(); }
 inline const csgl_string& ldcf_attrtype::v3_string() const { return get()->v3_string(); }
 inline const csgl_string& ldcf_attrtype::v3_string_inherited() const { return get()->v3_string_inherited(); }
 inline const csgl_string& ldcf_attrtype::xan_string() const { return get()->xan_string(); }
-inline void ldcf_attrtype::v3_file(const csgl_string& file) { get()->v3_file_ = file; }
 inline void ldcf_attrtype::xan_file(const csgl_string& file) { get()->xan_file_ = file; }
 
 // True when two sets hold types of the same primary names.

@@ -63,6 +63,8 @@ public:
         const int failed = existed_ ? ::rename(backup_, file_) : ::unlink(file_);
         if (failed != 0 && errno != ENOENT) {
             debug_error("Error - ldcf_schema: %s could not be put back, errno %d\n", file_.c_str(), errno);
+        } else if (existed_) {
+            ::unlink(backup_);  // a file that was never replaced has both names still
         }
     }
 
