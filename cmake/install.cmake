@@ -13,6 +13,7 @@ install(TARGETS dirsibling dirbase EXPORT dirbase
     FILE_SET HEADERS DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/dirbase)
 if(TARGET dirbase_tool)
     install(TARGETS dirbase_tool RUNTIME DESTINATION ${CMAKE_INSTALL_BINDIR})
+    install(FILES tools/dirbase/dirbase.1 DESTINATION ${CMAKE_INSTALL_MANDIR}/man1)
 endif()
 install(DIRECTORY share/schema/ DESTINATION ${CMAKE_INSTALL_DATADIR}/dirbase/schema)
 
