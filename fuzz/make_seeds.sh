@@ -84,6 +84,9 @@ XANattributeTypes{( 1.7 DBNAME 'h' ACCESS-CLASS sensitive LENGTH 9 EQUALITY 2 OR
 ENCRYPT AES-256 RETURN-VALUE type-only SECURE-CONNECTION-REQUIRED NONMATCHABLE )}
 attributeTypes{( 1.7 NAME 'i' EQUALITY caseIgnoreMatch SYNTAX '1.3.6.1.4.1.1466.115.121.1.15{8}' )}
 END
+cat >corpus/parse_str_fuzz/named-later <<'END'
+attributeTypes { ( 1.8 SUP name ) ( 1.8 NAME 'j' SUP name ) }
+END
 
 for file in core.at core.oc x509.sx config.at; do
     head -n 12 $schema/V3.$file >corpus/token_fuzz/$file

@@ -105,8 +105,8 @@ TEST(LdcfAttrtype, RefusalsNameWhatWasExpected)
         {"xan( 1 NAME )",
          GRAMMAR XAN_LIST " 'ENCRYPT' 'RETURN-VALUE' 'SECURE-CONNECTION-REQUIRED' 'NONMATCHABLE'" NOT_FOUND "'NAME )'"},
         {"xan( 1 DBNAME ( 'a' 'b' 'c' ) )",
-         "exc_invalid_grammar_t 16 @1: expected one or two quoted strings (database table and/or column names)" NOT_FOUND
-         "') )'"},
+         "exc_invalid_grammar_t 16 @1: expected one or two quoted strings (database table and/or column "
+         "names)" NOT_FOUND "') )'"},
         {"xan( 1 ACCESS-CLASS 1 )", TOKEN(17) "ACCESS-CLASS specification" NOT_FOUND "'1 )'"},
         {"xan( 1 ACCESS-CLASS x )",
          GRAMMAR "'normal' 'sensitive' 'critical' 'restricted' 'system' 'object'" NOT_FOUND "'x )'"},
@@ -168,6 +168,13 @@ TEST(LdcfAttrtype, AlternateDefinitionsAddTheirNamesToTheFirst)
     EXPECT_EQ(map.size(), 4u);
     EXPECT_STREQ(map["a"].v3_string(), "( 1 NAME ( 'm' 'a' 'z' ) DESC 'd' SYNTAX 5 )");
 
+    // A type that was known by its oid alone goes by the first name that it gets, so that its text can be read back.
+    attribute_map nameless;
+    read(nameless, "( 2 SYNTAX 5 )");
+    read(nameless, "( 2 NAME ( 'member' 'b' ) SYNTAX 5 )");
+    EXPECT_STREQ(nameless["2"].v3_string(), "( 2 NAME ( 'member' 'b' ) SYNTAX 5 )");
+    EXPECT_EQ(nameless["b"]->attr_id(), 0);
+
     const std::string rest = "EQUALITY e SYNTAX 5 SINGLE-VALUE";
     const std::pair<std::string, bool> items[] = {
         {"DESC 'e' SUP s EQUALITY e SYNTAX 5{9} SINGLE-VALUE", true},  // the length doesn't count
@@ -196,11 +203,11 @@ TEST(LdcfAttrtype, WellKnownAttributesHaveTheirNumberAndClass)
     const char* const lines[] = {
         "1 subschemasubentry 10 XAN-capabilitiessubentry 18 replicaCredentials -21 xan-enabledcapabilities -11 "
         "xan-supportedcapabilities -12 subtreeSpecification -1",
-        "3 aclpropagate -2 ownerpropagate -3 xan-filteraclinherit -4 xan-filteraclentry -5 aclsource -9 ownersource -10 "
-        "aclEntry -16 entryowner -17 xan-effectiveacl -18",
+        "3 aclpropagate -2 ownerpropagate -3 xan-filteraclinherit -4 xan-filteraclentry -5 aclsource -9 ownersource "
+        "-10 aclEntry -16 entryowner -17 xan-effectiveacl -18",
         "4 aliasedObjectName -1 aliasedentryName -1",
-        "5 xan-entryUUID 2 hasSubordinates 3 numSubordinates 24 xan-entryCheckSum 4 xan-entryCheckSumOp 5 creatorsName 6 "
-        "modifiersName 7 createTimestamp 8 modifytimestamp 9",
+        "5 xan-entryUUID 2 hasSubordinates 3 numSubordinates 24 xan-entryCheckSum 4 xan-entryCheckSumOp 5 creatorsName "
+        "6 modifiersName 7 createTimestamp 8 modifytimestamp 9",
         "6 xan-replicationthisserverismaster 20 xan-replicationisquiesced 21 xan-replicationChangeLDIF -1 "
         "xan-replicationLastActivationTime -1 xan-replicationLastChangeId -1 xan-replicationLastFinishTime -1 "
         "xan-replicationLastGlobalChangeId -1 xan-replicationLastResult -1 xan-replicationLastResultAdditional -1 "
@@ -209,8 +216,8 @@ TEST(LdcfAttrtype, WellKnownAttributesHaveTheirNumberAndClass)
         "7 pwdchangedtime 11 pwdaccountlockedtime 12 xan-pwdaccountlocked 25 pwdexpirationwarned 13 pwdfailuretime 14 "
         "pwdhistory 15 pwdgraceusetime 16 pwdReset 17 xan-pwdgrouppolicydn 27 xan-pwdindividualpolicydn 28",
         "8 xan-allmembers -7 xan-allgroups -8",
-        "9 MEMBER 0 uniqueMember 1 userpassword 22 secretkey 23 xan-replicaKeyPwd -22 changes -23 objectclass -6 cn -13 "
-        "xan-membergroup -14 ref -15 any -1",
+        "9 MEMBER 0 uniqueMember 1 userpassword 22 secretkey 23 xan-replicaKeyPwd -22 changes -23 objectclass -6 cn "
+        "-13 xan-membergroup -14 ref -15 any -1",
         "10 xan-vrndCryptoSync -19 xan-vrndCryptoSalt -20",
     };
     for (const char* const line : lines) {
@@ -239,7 +246,7 @@ TEST(LdcfAttrtype, ADefinitionListIsSearchedByNameAndByOid)
     }
     list.push_back(nullptr);
     const test_support::message_catcher log;
-    // The oid of the first counts, being read ahead of its fault; a quoted text ahead of NAME hides the name of the third.
+    // The oid of the first counts, being read ahead of its fault; a quoted text ahead of NAME hides the third's name.
     std::istringstream sought("a B c 1.3 oid.1.3 OID.1.6 1.4 1.2 | hidden x 1.5 1.30 oid.a word");
     bool found = true;
     for (std::string name; sought >> name;) {

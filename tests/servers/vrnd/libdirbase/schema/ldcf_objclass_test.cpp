@@ -23,8 +23,9 @@ void load(ldcf_schema& schema, const std::string& classes)
 
 #define KEYWORDS "'NAME' 'DESC' 'OBSOLETE' 'SUP'  'ABSTRACT' 'STRUCTURAL' 'AUXILIARY' 'MUST' 'MAY'"
 #define OF "expected one of the following: "
-#define KINDS \
-    "exc_invalid_input_t 0: 1 has too many object class types.The type can be only one of the [ABSTRACT|STRUCTURAL|AUXILIARY]"
+#define KINDS                                                                                   \
+    "exc_invalid_input_t 0: 1 has too many object class types.The type can be only one of the " \
+    "[ABSTRACT|STRUCTURAL|AUXILIARY]"
 #define CYCLE "exc_invalid_input_t -36: There is a cycle in the supertype specification: "
 #define MISSING " not found when processing object class "
 

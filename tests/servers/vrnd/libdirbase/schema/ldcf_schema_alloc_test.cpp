@@ -1,5 +1,5 @@
-// The schema engine with every allocation failing in turn: one class of exception, nothing lost, the active schema and its
-// files unchanged.
+// The schema engine with every allocation failing in turn: one class of exception, nothing lost, the active schema and
+// its files unchanged.
 #include <functional>
 #include <optional>
 

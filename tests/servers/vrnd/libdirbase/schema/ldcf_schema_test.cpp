@@ -262,7 +262,8 @@ TEST_F(SchemaChange, RefusalsOfSingleDefinitionsNameTheReason)
         {"erase type ( 9.5 NAME 'sn' )",
          "exc_invalid_input_t -29: attribute type: OID '9.5' and 'sn' do not refer to the same attribute type"},
         {"erase rule ( 2.5.13.2 NAME 'integerMatch' SYNTAX 5 )",
-         "exc_invalid_input_t -29: matching rule: OID '2.5.13.2' and 'integerMatch' do not refer to the same matching rule"},
+         "exc_invalid_input_t -29: matching rule: OID '2.5.13.2' and 'integerMatch' do not refer to the same matching "
+         "rule"},
         {"erase type ( 9.2 )",  // three subtypes and two lists of classes more than expected
          "exc_invalid_state_t -32: attribute type '9.2' can not be deleted; its refcount is 8.  It should be 3"},
         {"erase type ( 9.3 )",

@@ -25,8 +25,9 @@ namespace schema_test {
 #define ARC "1.3.6.1.4.1.1466.115.121.1."
 #define NOT_FOUND ", but could not find it at or before "
 
-// What an action raises: "class id: text", with "@line" behind a positive id (a fault in schema text) and "(code)" behind
-// a class whose code is the raiser's; empty for nothing. `arguments` takes what was logged, without empty ones at the end.
+// What an action raises: "class id: text", with "@line" behind a positive id (a fault in schema text) and "(code)"
+// behind a class whose code is the raiser's; empty for nothing. `arguments` takes what was logged, without empty ones
+// at the end.
 template <typename Action>
 std::string refused(const Action& action, std::vector<std::string>* arguments = nullptr)
 {
