@@ -1,7 +1,8 @@
 // The debug log: free text for the developer, off until a level is set.
 //
-// The level is a mask of classes. PrintDebug writes a text when its class meets the mask; the helpers below stand in front
-// of it so that nothing is formatted while the log is off. Every function may be called from any thread and never throws.
+// The level is a mask of classes. PrintDebug writes a text when its class meets the mask; the helpers below stand in
+// front of it so that nothing is formatted while the log is off. Every function may be called from any thread and never
+// throws.
 #pragma once
 
 #include "libraries/dirbase_export.h"
@@ -10,8 +11,8 @@
 constexpr unsigned LDAP_DEBUG_TRACE = 0x00000001u;  // what happens, step by step
 constexpr unsigned LDAP_DEBUG_ERROR = 0xC8110000u;  // something failed
 
-// Takes debug texts in place of the built-in sinks. Called under the log's own lock; `text` is borrowed for the call and
-// is as the caller formatted it, line feed included.
+// Takes debug texts in place of the built-in sinks. Called under the log's own lock; `text` is borrowed for the call
+// and is as the caller formatted it, line feed included.
 using debug_sink = void (*)(void* context, unsigned level, const char* text);
 
 extern "C" {
@@ -34,15 +35,15 @@ DIRBASE_EXPORT int set_debug_file(const char* path);
 
 // A failure, told at the place that knows: debug_error("Error - dn_check: %s\n", text). By custom an error text begins
 // with "Error - " and ends with a line feed.
-#define debug_error(...)                                      \
-    do {                                                      \
-        if ((read_ldap_debug() & LDAP_DEBUG_ERROR) != 0)      \
-            PrintDebug(LDAP_DEBUG_ERROR, __VA_ARGS__);        \
+#define debug_error(...)                                 \
+    do {                                                 \
+        if ((read_ldap_debug() & LDAP_DEBUG_ERROR) != 0) \
+            PrintDebug(LDAP_DEBUG_ERROR, __VA_ARGS__);   \
     } while (false)
 
 // A step worth following.
-#define debug_trace(...)                                      \
-    do {                                                      \
-        if ((read_ldap_debug() & LDAP_DEBUG_TRACE) != 0)      \
-            PrintDebug(LDAP_DEBUG_TRACE, __VA_ARGS__);        \
+#define debug_trace(...)                                 \
+    do {                                                 \
+        if ((read_ldap_debug() & LDAP_DEBUG_TRACE) != 0) \
+            PrintDebug(LDAP_DEBUG_TRACE, __VA_ARGS__);   \
     } while (false)

@@ -1,10 +1,10 @@
 // The message log: numbered messages for the administrator, worded by a catalogue.
 //
-// A message is a component, a severity, an id and its arguments. The catalogue (catalogue.cpp) holds an English text for
-// each (component, id); its places are positional ("%1$s"), so a translation may reorder them. The arguments travel with
-// their types, so a text that names a place twice, skips one or asks for one that was not given prints something sensible
-// and never reads what isn't there. An id that the catalogue doesn't know still prints its component, severity, id and
-// arguments.
+// A message is a component, a severity, an id and its arguments. The catalogue (catalogue.cpp) holds an English text
+// for each (component, id); its places are positional ("%1$s"), so a translation may reorder them. The arguments travel
+// with their types, so a text that names a place twice, skips one or asks for one that was not given prints something
+// sensible and never reads what isn't there. An id that the catalogue doesn't know still prints its component,
+// severity, id and arguments.
 //
 // Every function here may be called from any thread at any time and never throws.
 #pragma once
@@ -70,8 +70,8 @@ DIRBASE_EXPORT void PrintMessageArguments(int component, int severity, int id, c
 
 // Renders the text of a message (no time, severity or id) into `buffer`, cut to at most size - 1 bytes and always
 // zero-terminated when size is above 0. A cut never splits a UTF-8 character. Returns the length of the uncut text.
-DIRBASE_EXPORT std::size_t getPrintedMessageArguments(char* buffer, std::size_t size, int component, int severity, int id,
-                                                      const message_argument* arguments, std::size_t count);
+DIRBASE_EXPORT std::size_t getPrintedMessageArguments(char* buffer, std::size_t size, int component, int severity,
+                                                      int id, const message_argument* arguments, std::size_t count);
 
 // Chooses where messages go: a function, or with a null function back to standard error, the sink at start.
 DIRBASE_EXPORT void set_message_sink(message_sink sink, void* context);

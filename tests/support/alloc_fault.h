@@ -1,13 +1,14 @@
 // Makes the first, second, ... n-th allocation of a call fail, one per run, to show that each failure is survived.
 //
-// The program that links alloc_fault.cpp (all *_alloc_test.cpp files share one) has every form of operator new and delete
-// replaced, and so have the shared libraries in it, whose calls are bound to the program's symbols. Without a sanitizer
-// malloc, calloc, realloc and free are replaced too, so whatever the C library makes with them (strdup) fails as well; a
-// sanitizer brings its own, so there only operator new fails, and LeakSanitizer looks after the blocks of malloc.
+// The program that links alloc_fault.cpp (all *_alloc_test.cpp files share one) has every form of operator new and
+// delete replaced, and so have the shared libraries in it, whose calls are bound to the program's symbols. Without a
+// sanitizer malloc, calloc, realloc and free are replaced too, so whatever the C library makes with them (strdup) fails
+// as well; a sanitizer brings its own, so there only operator new fails, and LeakSanitizer looks after the blocks of
+// malloc.
 //
 // Counters are the thread's own: what other threads allocate is neither counted nor made to fail. So a body starts no
-// thread: what one allocates and another releases looks like a leak. Memory for an exception in flight is never refused,
-// or a throw for quite another reason would count as a failed allocation.
+// thread: what one allocates and another releases looks like a leak. Memory for an exception in flight is never
+// refused, or a throw for quite another reason would count as a failed allocation.
 //
 //     TEST(DnNormalizeAlloc, EveryFailureGivesNoMemory)
 //     {
@@ -27,9 +28,9 @@
 
 namespace test_support {
 
-// Runs `body` once without failures (point 0), then again and again with its 1st (point 1), 2nd, ... allocation failing,
-// until a run ends without having come to its failing allocation. Returns the number of allocations that failed; none at
-// all is a test failure, since then nothing was shown.
+// Runs `body` once without failures (point 0), then again and again with its 1st (point 1), 2nd, ... allocation
+// failing, until a run ends without having come to its failing allocation. Returns the number of allocations that
+// failed; none at all is a test failure, since then nothing was shown.
 //
 //   body  takes the point, checks for itself what it expects, and leaves nothing behind. Once an allocation has failed it
 //         may end by any exception; before that, an exception passes through to the caller.

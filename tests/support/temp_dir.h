@@ -12,8 +12,8 @@
 
 namespace test_support {
 
-// Every failure is raised as std::filesystem::filesystem_error, which fails the test that asked. Not to be shared between
-// threads; two objects never share a folder, in one process or in several.
+// Every failure is raised as std::filesystem::filesystem_error, which fails the test that asked. Not to be shared
+// between threads; two objects never share a folder, in one process or in several.
 class temp_dir {
 public:
     // Makes a new folder, readable by its owner only, below TMPDIR or else /tmp.

@@ -1,8 +1,8 @@
 // The exceptions of the foundation and the schema engine: one tree, rooted at exc_t.
 //
-// A class says what happened by its type alone; the fields (code, place, message) are those of the root. An exception with a
-// message id logs itself once, while it is built, so whoever catches it does not log it again. Exceptions of this tree end
-// at the exported functions that return result codes.
+// A class says what happened by its type alone; the fields (code, place, message) are those of the root. An exception
+// with a message id logs itself once, while it is built, so whoever catches it does not log it again. Exceptions of
+// this tree end at the exported functions that return result codes.
 #pragma once
 
 #include <cstdint>
@@ -16,8 +16,8 @@ class DIRBASE_EXPORT exc_t {
 public:
     // Builds the message and logs it with severity 8.
     //
-    //   file, line  the raising place; the text of file is kept, not copied. For a fault in schema text it is the name of
-    //               the source, which lives as long as the source's reader: a handler further up must not use it.
+    //   file, line  the raising place; the text of file is kept, not copied. For a fault in schema text it is the name
+    //               of the source, which lives as long as the source's reader: a handler further up must not use it.
     //   text        the message with its markers (csgl_message.h)
     //   code        the class's number, an LDAP result code in exc_ldap_rc_t, a foreign code in exc_unmapped_t
     //   message_id  message and catalogue number (csgl_get_msgid, csgl_get_catid); 0 logs nothing
@@ -35,8 +35,9 @@ public:
     // itself never reads it.
     static bool be_quiet(bool quiet);
 
-    // Raise the class that stands for a foreign code, or return when the code is 0. An unknown code raises exc_unmapped_t
-    // with that code. throw_posix_error takes an errno; throw_last_tcpip_error takes the calling thread's.
+    // Raise the class that stands for a foreign code, or return when the code is 0. An unknown code raises
+    // exc_unmapped_t with that code. throw_posix_error takes an errno; throw_last_tcpip_error takes the calling
+    // thread's.
     static void throw_csgl_error(const char* file, int line, long code, const char* message);
     static void throw_cspl_error(const char* file, int line, long code);
     static void throw_posix_error(const char* file, int line, long code);
@@ -52,44 +53,45 @@ private:
     csgl_message message_;
 };
 
-// Prints "exc ", the file in single quotes, the line, the code as an unsigned number, and the sentence in single quotes.
+// Prints "exc ", the file in single quotes, the line, the code as an unsigned number, and the sentence in single
+// quotes.
 DIRBASE_EXPORT csgl_output& operator<<(csgl_output& output, const exc_t& exception);
 
 // A class that is caught and never raised.
-#define CSGL_EXCEPTION_GROUP(name, parent)                                                            \
-    class DIRBASE_EXPORT name : public parent {                                                       \
-    protected:                                                                                        \
-        name(const char* file, int line, const char* text, std::int64_t code, int message_id)         \
-            : parent(file, line, text, code, message_id)                                              \
-        {                                                                                             \
-        }                                                                                             \
+#define CSGL_EXCEPTION_GROUP(name, parent)                                                    \
+    class DIRBASE_EXPORT name : public parent {                                               \
+    protected:                                                                                \
+        name(const char* file, int line, const char* text, std::int64_t code, int message_id) \
+            : parent(file, line, text, code, message_id)                                      \
+        {                                                                                     \
+        }                                                                                     \
     };
 
 // A class that is raised with the code of its own, and may have children with theirs.
-#define CSGL_EXCEPTION(name, parent, number)                                                          \
-    class DIRBASE_EXPORT name : public parent {                                                       \
-    public:                                                                                           \
-        static constexpr std::int64_t class_code = number;                                            \
-        name(const char* file, int line, const char* text, int message_id)                            \
-            : parent(file, line, text, class_code, message_id)                                        \
-        {                                                                                             \
-        }                                                                                             \
-                                                                                                      \
-    protected:                                                                                        \
-        name(const char* file, int line, const char* text, std::int64_t code, int message_id)         \
-            : parent(file, line, text, code, message_id)                                              \
-        {                                                                                             \
-        }                                                                                             \
+#define CSGL_EXCEPTION(name, parent, number)                                                  \
+    class DIRBASE_EXPORT name : public parent {                                               \
+    public:                                                                                   \
+        static constexpr std::int64_t class_code = number;                                    \
+        name(const char* file, int line, const char* text, int message_id)                    \
+            : parent(file, line, text, class_code, message_id)                                \
+        {                                                                                     \
+        }                                                                                     \
+                                                                                              \
+    protected:                                                                                \
+        name(const char* file, int line, const char* text, std::int64_t code, int message_id) \
+            : parent(file, line, text, code, message_id)                                      \
+        {                                                                                     \
+        }                                                                                     \
     };
 
 // A class that is raised with a code that the raiser chooses.
-#define CSGL_EXCEPTION_WITH_CODE(name, parent)                                                        \
-    class DIRBASE_EXPORT name : public parent {                                                       \
-    public:                                                                                           \
-        name(const char* file, int line, const char* text, std::int64_t code, int message_id)         \
-            : parent(file, line, text, code, message_id)                                              \
-        {                                                                                             \
-        }                                                                                             \
+#define CSGL_EXCEPTION_WITH_CODE(name, parent)                                                \
+    class DIRBASE_EXPORT name : public parent {                                               \
+    public:                                                                                   \
+        name(const char* file, int line, const char* text, std::int64_t code, int message_id) \
+            : parent(file, line, text, code, message_id)                                      \
+        {                                                                                     \
+        }                                                                                     \
     };
 
 // The caller or the program is wrong.

@@ -69,7 +69,8 @@ int open_flags(action_indicator action, access_requested_indicator access, acces
     return flags;
 }
 
-int open_path(const char* path, action_indicator action, access_requested_indicator access, access_denied_indicator denied)
+int open_path(const char* path, action_indicator action, access_requested_indicator access,
+              access_denied_indicator denied)
 {
     const int flags = open_flags(action, access, denied);
     struct stat before {};

@@ -109,9 +109,9 @@ public:
     static void copy(const char* from, const char* to);
     static void copy(const char* from, const char* to, force_indicator force);
 
-    // Renames a file within a file system. The first form refuses an existing target; the second removes it first, so for
-    // a moment no file stands under the target's name. Two names of one file lose the first name and keep the file; a
-    // name renamed to itself is left alone.
+    // Renames a file within a file system. The first form refuses an existing target; the second removes it first, so
+    // for a moment no file stands under the target's name. Two names of one file lose the first name and keep the file;
+    // a name renamed to itself is left alone.
     static void rename(const char* from, const char* to);
     static void rename(const char* from, const char* to, force_indicator force);
 

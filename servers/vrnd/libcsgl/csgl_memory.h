@@ -13,8 +13,8 @@
 // Raises exc_not_enough_memory_t, "not enough memory", with the place that asked.
 [[noreturn]] DIRBASE_EXPORT void csgl_throw_no_memory(const char* file, int line);
 
-// A block of at least `size` bytes for csgl_free. When there is none the first raises exc_not_enough_memory_t, the second
-// gives null.
+// A block of at least `size` bytes for csgl_free. When there is none the first raises exc_not_enough_memory_t, the
+// second gives null.
 DIRBASE_EXPORT void* csgl_allocate(std::size_t size, const char* file, int line);
 DIRBASE_EXPORT void* csgl_allocate_or_null(std::size_t size) noexcept;
 DIRBASE_EXPORT void csgl_free(void* block) noexcept;

@@ -128,9 +128,9 @@ bool csgl_message_::try_init(const char* text, unsigned length, int number, cons
     return true;
 }
 
-// Splits the text into the sentence (plain) and the parameters (second area, which receives every byte of the text too, so
-// that a parameter's text is whole there). A text that refers to its variable part once always fits its area; one that
-// does so more often is cut.
+// Splits the text into the sentence (plain) and the parameters (second area, which receives every byte of the text too,
+// so that a parameter's text is whole there). A text that refers to its variable part once always fits its area; one
+// that does so more often is cut.
 void csgl_message_::take_apart(const char* text, const char* end) noexcept
 {
     std::string_view rest(text, static_cast<std::size_t>(end - text));
@@ -188,15 +188,16 @@ void csgl_message_::log(int severity, int catalogue)
     if (number_ < 0) {
         const auto id = static_cast<int>(magnitude(number_));
         PrintMessage(catalogue, severity, id, p[0], p[1], p[2], p[3], p[4], p[5], p[6], p[7], p[8], p[9]);
-        getPrintedMessage(printed_, block_size_ / 2, catalogue, severity, id, p[0], p[1], p[2], p[3], p[4], p[5],
-                          p[6], p[7], p[8], p[9]);
+        getPrintedMessage(printed_, block_size_ / 2, catalogue, severity, id, p[0], p[1], p[2], p[3], p[4], p[5], p[6],
+                          p[7], p[8], p[9]);
         return;
     }
     const bool over_ldap = file_ == nullptr || *file_ == '\0';
     const char* place = over_ldap ? ldap_place : file_;
-    PrintMessage(catalogue, severity, number_, place, line_, p[0], p[1], p[2], p[3], p[4], p[5], p[6], p[7], p[8], p[9]);
-    getPrintedMessage(printed_, block_size_ / 2, catalogue, severity, number_, place, line_, p[0], p[1], p[2], p[3], p[4],
-                      p[5], p[6], p[7], p[8], p[9]);
+    PrintMessage(catalogue, severity, number_, place, line_, p[0], p[1], p[2], p[3], p[4], p[5], p[6], p[7], p[8],
+                 p[9]);
+    getPrintedMessage(printed_, block_size_ / 2, catalogue, severity, number_, place, line_, p[0], p[1], p[2], p[3],
+                      p[4], p[5], p[6], p[7], p[8], p[9]);
     if (over_ldap) {
         char* found = std::strstr(printed_, ldap_prefix);
         printed_ = found == nullptr ? nullptr : found + sizeof(ldap_prefix) - 1;

@@ -1,13 +1,15 @@
 // The message inside an exception: a readable sentence and a list of catalogue parameters in one text.
 //
-// A message is given with markers. "[p[" and "]p]" stand around a parameter, which also stays part of the sentence. "[v["
-// and "]v]" at the very start set a variable part aside, and "[v[=v=VAR=v=]v]" puts it into the sentence as a parameter.
-// So "[v['a b']v]expected [p[oid]p] at [v[=v=VAR=v=]v]" reads: expected oid at 'a b', with the parameters oid and 'a b'.
+// A message is given with markers. "[p[" and "]p]" stand around a parameter, which also stays part of the sentence.
+// "[v[" and "]v]" at the very start set a variable part aside, and "[v[=v=VAR=v=]v]" puts it into the sentence as a
+// parameter. So "[v['a b']v]expected [p[oid]p] at [v[=v=VAR=v=]v]" reads: expected oid at 'a b', with the parameters
+// oid and 'a b'.
 #pragma once
 
 #include "servers/vrnd/libcsgl/csgl_refcounted.h"
 
-// The body. It holds all its texts in one block of three areas: the sentence, the parameters, the catalogue's rendering.
+// The body. It holds all its texts in one block of three areas: the sentence, the parameters, the catalogue's
+// rendering.
 class DIRBASE_EXPORT csgl_message_ : public csgl_refcounted<csgl_message_> {
 public:
     static constexpr int parameter_limit = 10;
@@ -73,7 +75,7 @@ public:
     const char* printed() const { return get() == nullptr || get()->printed() == nullptr ? "" : get()->printed(); }
 };
 
-// A message id is a message number, or with bit 30 of its magnitude set a catalogue (bits 16 to 29) and a number (bits 0 to
-// 15). Its sign goes with the number. Without a catalogue of its own an id belongs to the schema's, 4.
+// A message id is a message number, or with bit 30 of its magnitude set a catalogue (bits 16 to 29) and a number (bits
+// 0 to 15). Its sign goes with the number. Without a catalogue of its own an id belongs to the schema's, 4.
 DIRBASE_EXPORT int csgl_get_catid(int id);
 DIRBASE_EXPORT int csgl_get_msgid(int id);

@@ -78,7 +78,8 @@ public:
     void really_put_char(char) override {}
 };
 
-// Writes to two streams of the caller, with byte 0 as a line feed in the second, until halt_redirection ends the second.
+// Writes to two streams of the caller, with byte 0 as a line feed in the second, until halt_redirection ends the
+// second.
 class DIRBASE_EXPORT csgl_output_redirector : public csgl_output_imp {
 public:
     csgl_output_redirector(csgl_output& primary, csgl_output& secondary) : primary_(&primary), secondary_(&secondary) {}

@@ -1,8 +1,8 @@
 // Counted bodies and the handles on them.
 //
-// A body derives from csgl_refcounted<T> and starts with count 0; every csgl_refcounted_pointer_to<T> on it counts once,
-// and the handle that brings the count back to 0 destroys it. Handles on one body may be copied and dropped by many threads;
-// one handle object belongs to one thread at a time.
+// A body derives from csgl_refcounted<T> and starts with count 0; every csgl_refcounted_pointer_to<T> on it counts
+// once, and the handle that brings the count back to 0 destroys it. Handles on one body may be copied and dropped by
+// many threads; one handle object belongs to one thread at a time.
 #pragma once
 
 #include <pthread.h>
@@ -73,7 +73,10 @@ public:
     csgl_refcounted_pointer_to() = default;
     explicit csgl_refcounted_pointer_to(T* body) : body_(body) { take(); }
     csgl_refcounted_pointer_to(const csgl_refcounted_pointer_to& other) : body_(other.body_) { take(); }
-    csgl_refcounted_pointer_to(csgl_refcounted_pointer_to&& other) noexcept : body_(other.body_) { other.body_ = nullptr; }
+    csgl_refcounted_pointer_to(csgl_refcounted_pointer_to&& other) noexcept : body_(other.body_)
+    {
+        other.body_ = nullptr;
+    }
     ~csgl_refcounted_pointer_to() { drop(body_); }
 
     // The new reference is taken before the old one is dropped, so that a handle may be assigned to itself.

@@ -1,8 +1,8 @@
 // The text type of the foundation and the schema engine.
 //
-// A csgl_string is a handle on a shared body; copying it shares the text, and appending to a shared text makes a new body
-// for this handle alone. Texts up to 31 bytes lie inside the body, longer ones in one heap block whose sizes grow in steps
-// (csgl_string_::allocation_size). A text never holds a byte 0: all copying stops there.
+// A csgl_string is a handle on a shared body; copying it shares the text, and appending to a shared text makes a new
+// body for this handle alone. Texts up to 31 bytes lie inside the body, longer ones in one heap block whose sizes grow
+// in steps (csgl_string_::allocation_size). A text never holds a byte 0: all copying stops there.
 #pragma once
 
 #include <cstdint>
@@ -69,7 +69,8 @@ public:
     unsigned length() const { return get()->length(); }
     bool empty() const { return length() == 0; }
 
-    // Replaces the text: in place when this handle is alone on its body, else in a new one. The constructor's rules hold.
+    // Replaces the text: in place when this handle is alone on its body, else in a new one. The constructor's rules
+    // hold.
     void assign(const char* text, unsigned length);
 
     // Adds at most `length` bytes; all other handles on the body keep the old text.
@@ -116,8 +117,8 @@ struct csgl_str_quoted {
     char quote;
 };
 
-// Compares by the C library's tolower of each byte: the difference of the first two lowered bytes that differ, each taken
-// as signed, or 0.
+// Compares by the C library's tolower of each byte: the difference of the first two lowered bytes that differ, each
+// taken as signed, or 0.
 DIRBASE_EXPORT int csgl_str_ci_compare(const char* a, const char* b);
 
 // The order of all schema names and OIDs.

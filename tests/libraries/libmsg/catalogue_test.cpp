@@ -1,5 +1,5 @@
-// Messages that the catalogue lacks, and the printing of places. That a fault of the schema reads in the log as it does in its
-// exception is asserted wherever the tests of the schema engine raise one.
+// Messages that the catalogue lacks, and the printing of places. That a fault of the schema reads in the log as it does
+// in its exception is asserted wherever the tests of the schema engine raise one.
 #include <gtest/gtest.h>
 
 #include <cstddef>

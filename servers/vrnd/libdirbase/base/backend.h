@@ -11,8 +11,8 @@ struct Backend {
     const char* be_type;  // "rdbm" for the relational store, "proxy", "ldcf" for the schema store
     Backend* be_next;     // next on the list
 
-    // What stands in front of the names of a relational store's tables, for example their owner, and the table that holds
-    // entry-level attributes. The texts stay with the back end.
+    // What stands in front of the names of a relational store's tables, for example their owner, and the table that
+    // holds entry-level attributes. The texts stay with the back end.
     const char* (*be_table_qualifier)(Backend* be);
     const char* (*be_entry_table)(Backend* be);
 };

@@ -1,8 +1,8 @@
 // Attribute types (RFC 4512, section 4.1.2), each with the server's own description of how it is stored and protected.
 //
-// A type has two texts that may come from two sources in any order: the standard definition and the extended one. They meet
-// in one body through the oid. The shape is that of ldcf_syntax.h; besides, a type inherits from its supertype what it leaves
-// out, and incomplete takes that away again.
+// A type has two texts that may come from two sources in any order: the standard definition and the extended one. They
+// meet in one body through the oid. The shape is that of ldcf_syntax.h; besides, a type inherits from its supertype
+// what it leaves out, and incomplete takes that away again.
 #pragma once
 
 #include "servers/vrnd/libdirbase/schema/ldcf_matchrule.h"
@@ -64,8 +64,8 @@ enum ldcf_index : unsigned {
     ldcf_index_count,
 };
 
-// The number and the class of an attribute as the back ends know it: -1 and a class for most, a number of its own for the
-// well-known ones (ldcf_well_known.cpp).
+// The number and the class of an attribute as the back ends know it: -1 and a class for most, a number of its own for
+// the well-known ones (ldcf_well_known.cpp).
 struct ldcf_attr_identity {
     int attr_id;
     int attr_class;
@@ -78,10 +78,11 @@ class DIRBASE_EXPORT ldcf_attrtype : public csgl_refcounted_pointer_to<ldcf_attr
 public:
     using csgl_refcounted_pointer_to::csgl_refcounted_pointer_to;
 
-    // Reads one standard definition: a new type, the other half of a type whose extended definition was read before, or an
-    // alternate definition of a type of the same source, which must agree with it in all but its names and adds these (a type without a name takes the primary one).
-    // Raises the exceptions of the token layer and exc_invalid_state_t for a type that is being completed or complete. A
-    // failure enters nothing in the map, but may leave a type that was found there partly filled.
+    // Reads one standard definition: a new type, the other half of a type whose extended definition was read before, or
+    // an alternate definition of a type of the same source, which must agree with it in all but its names and adds
+    // these (a type without a name takes the primary one). Raises the exceptions of the token layer and
+    // exc_invalid_state_t for a type that is being completed or complete. A failure enters nothing in the map, but may
+    // leave a type that was found there partly filled.
     static void parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_attrtype>& map);
 
     // Reads one extended definition, which names its type by oid or by a name that is known already.
@@ -93,8 +94,8 @@ public:
     // Puts the last token back and fails with the text of a bad SYNTAX.
     [[noreturn]] static void throw_syntax_error(ldcf_token_factory& factory);
 
-    // True when one of a null-terminated array of standard definition texts is that of `attribute`, a name, a numeric oid
-    // or "oid." and an oid. A text that can't be read is no match.
+    // True when one of a null-terminated array of standard definition texts is that of `attribute`, a name, a numeric
+    // oid or "oid." and an oid. A text that can't be read is no match.
     static bool attributeTypesContainsAttr(char** definitions, char* attribute);
 
     const csgl_string& oid() const;
@@ -112,8 +113,8 @@ public:
     void retarget(const ldcf_translation<ldcf_attrtype>& attributes, const ldcf_translation<ldcf_matchrule>& rules,
                   const ldcf_translation<ldcf_syntax>& syntaxes);
 
-    // Compares complete types; descriptions don't count. Of the extended definitions the oid, the names in the store and
-    // the access class do.
+    // Compares complete types; descriptions don't count. Of the extended definitions the oid, the names in the store
+    // and the access class do.
     bool v3_syntax_equal(const ldcf_attrtype& other) const;
     bool xan_syntax_equal(const ldcf_attrtype& other) const;
 };
@@ -175,8 +176,8 @@ public:
     const csgl_string& v3_file() const { return v3_file_; }
     const csgl_string& xan_file() const { return xan_file_; }
 
-    // The text forms, built once and kept: the standard definition as it was written, what a complete type inherits beyond
-    // that, and the extended definition (empty when there is none).
+    // The text forms, built once and kept: the standard definition as it was written, what a complete type inherits
+    // beyond that, and the extended definition (empty when there is none).
     const csgl_string& v3_string() const;
     const csgl_string& v3_string_inherited() const;
     const csgl_string& xan_string() const;
@@ -187,9 +188,9 @@ public:
     // True when the inherited form has something to say.
     bool v3_inherited() const;
 
-    // Links the type, after its supertypes, to what it refers to, and lets it inherit. Raises exc_invalid_input_t for what
-    // is missing or doesn't fit; the type and those on its chain then stay in state `completing` or `cycle_found`, and
-    // incomplete must run before another try (else exc_invalid_state_t).
+    // Links the type, after its supertypes, to what it refers to, and lets it inherit. Raises exc_invalid_input_t for
+    // what is missing or doesn't fit; the type and those on its chain then stay in state `completing` or `cycle_found`,
+    // and incomplete must run before another try (else exc_invalid_state_t).
     void complete(const ldcf_map_name_to<ldcf_attrtype>& attributes, const ldcf_map_name_to<ldcf_matchrule>& rules,
                   const ldcf_map_name_to<ldcf_syntax>& syntaxes);
 
@@ -275,12 +276,30 @@ private:
     bool may_be_encrypted_ = true;
 };
 
-inline const csgl_string& ldcf_attrtype::oid() const { return get()->oid(); }
-inline const csgl_string& ldcf_attrtype::name() const { return get()->name(); }
-inline const csgl_string& ldcf_attrtype::v3_string() const { return get()->v3_string(); }
-inline const csgl_string& ldcf_attrtype::v3_string_inherited() const { return get()->v3_string_inherited(); }
-inline const csgl_string& ldcf_attrtype::xan_string() const { return get()->xan_string(); }
-inline void ldcf_attrtype::xan_file(const csgl_string& file) { get()->xan_file_ = file; }
+inline const csgl_string& ldcf_attrtype::oid() const
+{
+    return get()->oid();
+}
+inline const csgl_string& ldcf_attrtype::name() const
+{
+    return get()->name();
+}
+inline const csgl_string& ldcf_attrtype::v3_string() const
+{
+    return get()->v3_string();
+}
+inline const csgl_string& ldcf_attrtype::v3_string_inherited() const
+{
+    return get()->v3_string_inherited();
+}
+inline const csgl_string& ldcf_attrtype::xan_string() const
+{
+    return get()->xan_string();
+}
+inline void ldcf_attrtype::xan_file(const csgl_string& file)
+{
+    get()->xan_file_ = file;
+}
 
 // True when two sets hold types of the same primary names.
 DIRBASE_EXPORT bool ldcf_attrtype_set_equal(const csgl_set<ldcf_attrtype>& a, const csgl_set<ldcf_attrtype>& b);

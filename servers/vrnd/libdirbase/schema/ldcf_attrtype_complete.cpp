@@ -18,8 +18,13 @@ constexpr const char* change_log_attributes[] = {
 };
 
 constexpr const char* never_encrypted_syntaxes[] = {
-    ldcf_syntax_dn,       ldcf_syntax_boolean,  ldcf_syntax_integer,     ldcf_syntax_generalized_time,
-    ldcf_syntax_utc_time, ldcf_syntax_country,  ldcf_syntax_name_and_optional_uid,
+    ldcf_syntax_dn,
+    ldcf_syntax_boolean,
+    ldcf_syntax_integer,
+    ldcf_syntax_generalized_time,
+    ldcf_syntax_utc_time,
+    ldcf_syntax_country,
+    ldcf_syntax_name_and_optional_uid,
 };
 
 struct default_length {
@@ -43,8 +48,8 @@ int default_length_of(const csgl_string& syntax_oid)
     return length_of_other_syntaxes;
 }
 
-// Lets a reference share the text of the definition that it found, when it says the same to the letter: thousands of types
-// name the same few rules and syntaxes.
+// Lets a reference share the text of the definition that it found, when it says the same to the letter: thousands of
+// types name the same few rules and syntaxes.
 void share_text(csgl_string& reference, const csgl_string& found)
 {
     if (reference == found) {
@@ -145,6 +150,7 @@ void ldcf_attrtype_::finish_completion(const rule_map& rules, const syntax_map& 
     if (effective_length_ == 0) {
         effective_length_ = default_length_of(syntax_oid_);
     }
+    v3_string_inherited_.clear();  // one asked for ahead of time
     state_ = ldcf_attrtype_state::complete;
 }
 
@@ -169,8 +175,8 @@ void ldcf_attrtype_::inherit()
 void ldcf_attrtype_::resolve_syntax(const syntax_map& syntaxes)
 {
     if (syntax_oid_.empty()) {
-        LDCF_THROW_INPUT(("[p[" LDCF_KIND_ATTRIBUTE_TYPE "]p] ", ldcf_quoted_parameter(primary_name_), " (oid [p[", oid_,
-                          "]p]) does not have a syntax"),
+        LDCF_THROW_INPUT(("[p[" LDCF_KIND_ATTRIBUTE_TYPE "]p] ", ldcf_quoted_parameter(primary_name_), " (oid [p[",
+                          oid_, "]p]) does not have a syntax"),
                          LDCF_MSG_NO_SYNTAX);
     }
     syntax_ = ldcf_find(syntaxes, syntax_oid_);
@@ -232,9 +238,9 @@ void ldcf_attrtype_::check_encryption()
     if (attr_id() == attr_id_userpassword || attr_id() == attr_id_secretkey) {
         may_be_encrypted_ = false;
         if (encrypted) {
-            LDCF_THROW_INPUT(("Password attribute ", ldcf_quoted_parameter(primary_name_),
-                              " cannot be encypted in the schema."),
-                             LDCF_MSG_ENCRYPTED_PASSWORD);
+            LDCF_THROW_INPUT(
+                ("Password attribute ", ldcf_quoted_parameter(primary_name_), " cannot be encypted in the schema."),
+                LDCF_MSG_ENCRYPTED_PASSWORD);
         }
     }
 }
@@ -276,9 +282,9 @@ void ldcf_attrtype_::complete_db_names()
     const char* kind = "table name";
     for (const csgl_string& name : db_names_) {
         if (name.find('-') >= 0) {
-            LDCF_THROW_INPUT(("Hyphen is not allowed in [p[", kind, "]p] ", ldcf_quoted_parameter(name),
-                              ". Replace it with '_'"),
-                             0);
+            LDCF_THROW_INPUT(
+                ("Hyphen is not allowed in [p[", kind, "]p] ", ldcf_quoted_parameter(name), ". Replace it with '_'"),
+                0);
         }
         kind = "column name";
     }

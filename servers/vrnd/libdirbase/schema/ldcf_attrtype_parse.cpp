@@ -170,17 +170,17 @@ bool ldcf_attrtype_parser::read_xan_keyword(const ldcf_token& token)
     } else if (token.is("DBNAME")) {
         read_db_names();
     } else if (token.is("ACCESS-CLASS")) {
-        body_.access_class_ = read_word(
-            factory_, access_classes, "expected ACCESS-CLASS specification" LDCF_NOT_FOUND_AT,
-            LDCF_MSG_EXPECTED_ACCESS_CLASS,
-            LDCF_EXPECTED_ONE_OF("'normal' 'sensitive' 'critical' 'restricted' 'system' 'object'"));
+        body_.access_class_ =
+            read_word(factory_, access_classes, "expected ACCESS-CLASS specification" LDCF_NOT_FOUND_AT,
+                      LDCF_MSG_EXPECTED_ACCESS_CLASS,
+                      LDCF_EXPECTED_ONE_OF("'normal' 'sensitive' 'critical' 'restricted' 'system' 'object'"));
     } else if (token.is("LENGTH")) {
-        body_.length_ = ldcf_stream::number(ldcf_token(factory_, LDCF_EXPECTED("number after 'LENGTH'"), token_number,
-                                                       LDCF_MSG_EXPECTED_NUMBER));
+        body_.length_ = ldcf_stream::number(
+            ldcf_token(factory_, LDCF_EXPECTED("number after 'LENGTH'"), token_number, LDCF_MSG_EXPECTED_NUMBER));
     } else if (token.is("ENCRYPT")) {
-        body_.encryption_ = read_word(factory_, encryptions, "expected ENCRYPT specification" LDCF_NOT_FOUND_AT,
-                                      LDCF_MSG_EXPECTED_ENCRYPT,
-                                      LDCF_EXPECTED_ONE_OF("'SSHA' 'AES-128' 'AES-192' 'AES-256'"));
+        body_.encryption_ =
+            read_word(factory_, encryptions, "expected ENCRYPT specification" LDCF_NOT_FOUND_AT,
+                      LDCF_MSG_EXPECTED_ENCRYPT, LDCF_EXPECTED_ONE_OF("'SSHA' 'AES-128' 'AES-192' 'AES-256'"));
     } else if (token.is("RETURN-VALUE")) {
         body_.return_value_ =
             read_word(factory_, return_values, "expected RETURN-VALUE specification" LDCF_NOT_FOUND_AT,
@@ -199,9 +199,8 @@ void ldcf_attrtype_parser::read_db_names()
 {
     body_.db_names_ = ldcf_stream::qdstrings(factory_);
     if (body_.db_names_.empty() || body_.db_names_.size() > 2) {
-        factory_.throw_exc(
-            "expected one or two quoted strings (database table and/or column names)" LDCF_NOT_FOUND_AT,
-            LDCF_MSG_EXPECTED_DBNAME);
+        factory_.throw_exc("expected one or two quoted strings (database table and/or column names)" LDCF_NOT_FOUND_AT,
+                           LDCF_MSG_EXPECTED_DBNAME);
     }
 }
 
@@ -221,6 +220,7 @@ void ldcf_attrtype_parser::read_syntax()
 // "{number}", or nothing.
 void ldcf_attrtype_parser::read_syntax_length()
 {
+    body_.syntax_length_ = 0;  // of an earlier SYNTAX
     if (!ldcf_token(factory_)[token_left_brace]) {
         factory_.return_token();
         return;
@@ -336,9 +336,9 @@ void ldcf_attrtype::parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_
 
     if (alternate) {
         if (!agree(body, *found)) {
-            factory.throw_exc(ldcf_join("inconsistent [p[attribute types]p] ", ldcf_quoted_parameter(body.primary_name_),
-                                        " and ", ldcf_quoted_parameter(found->primary_name_), " (with OID [p[", oid,
-                                        "]p])"),
+            factory.throw_exc(ldcf_join("inconsistent [p[attribute types]p] ",
+                                        ldcf_quoted_parameter(body.primary_name_), " and ",
+                                        ldcf_quoted_parameter(found->primary_name_), " (with OID [p[", oid, "]p])"),
                               LDCF_MSG_ALTERNATE_DIFFERS);
         }
         ldcf_names all_names = found->names_;
@@ -359,11 +359,11 @@ void ldcf_attrtype::parse_xan(ldcf_token_factory& factory, ldcf_map_name_to<ldcf
 {
     const csgl_string oid = check_oid(factory);
     const ldcf_attrtype found = ldcf_find(map, oid);
-    if (found && (found->state_ == ldcf_attrtype_state::xan_defined ||
-                  found->state_ == ldcf_attrtype_state::both_defined)) {
-        factory.throw_exc(ldcf_join("attribute type ", ldcf_quoted_parameter(oid),
-                                    " already has an XAN extended definition"),
-                          LDCF_MSG_EXTENDED_TWICE);
+    if (found &&
+        (found->state_ == ldcf_attrtype_state::xan_defined || found->state_ == ldcf_attrtype_state::both_defined)) {
+        factory.throw_exc(
+            ldcf_join("attribute type ", ldcf_quoted_parameter(oid), " already has an XAN extended definition"),
+            LDCF_MSG_EXTENDED_TWICE);
     }
     const ldcf_attrtype attribute = found ? found : ldcf_attrtype(new ldcf_attrtype_(oid));
     ldcf_attrtype_& body = *attribute;

@@ -1,5 +1,5 @@
-// Which matching rules suit which syntax: a table of families, and a rule of its own for texts, whose rules must agree about
-// case.
+// Which matching rules suit which syntax: a table of families, and a rule of its own for texts, whose rules must agree
+// about case.
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libmsg/message_log.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_attrtype.h"
@@ -49,15 +49,9 @@ constexpr family families[] = {
      {{}},
      {{&ldcf_rule_dn_ordering}}},
     // Times, booleans, integers
-    {{ldcf_syntax_generalized_time},
-     {{&ldcf_rule_generalized_time}},
-     {{}},
-     {{&ldcf_rule_generalized_time_ordering}}},
+    {{ldcf_syntax_generalized_time}, {{&ldcf_rule_generalized_time}}, {{}}, {{&ldcf_rule_generalized_time_ordering}}},
     {{ldcf_syntax_boolean}, {{&ldcf_rule_boolean}}, {{}}, {{}}},
-    {{ldcf_syntax_integer},
-     {{&ldcf_rule_integer, &ldcf_rule_integer_first}},
-     {{}},
-     {{&ldcf_rule_integer_ordering}}},
+    {{ldcf_syntax_integer}, {{&ldcf_rule_integer, &ldcf_rule_integer_first}}, {{}}, {{&ldcf_rule_integer_ordering}}},
     // Binary values
     {{ldcf_syntax_binary, ldcf_syntax_certificate, ldcf_syntax_certificate_list, ldcf_syntax_certificate_pair,
       ldcf_syntax_octet_string, ldcf_syntax_fax, ldcf_syntax_jpeg},
@@ -92,8 +86,8 @@ constexpr rule_list exact_substr{{&ldcf_rule_case_exact_substrings}};
 constexpr rule_list exact_ordering{{&ldcf_rule_case_exact_ordering}};
 constexpr rule_list ignoring_equality{{&ldcf_rule_case_ignore, &ldcf_rule_case_ignore_ia5, &ldcf_rule_case_ignore_list,
                                        &ldcf_rule_presentation_address, &ldcf_rule_protocol_information}};
-constexpr rule_list ignoring_substr{{&ldcf_rule_case_ignore_substrings, &ldcf_rule_case_ignore_ia5_substrings,
-                                     &ldcf_rule_case_ignore_list_substrings}};
+constexpr rule_list ignoring_substr{
+    {&ldcf_rule_case_ignore_substrings, &ldcf_rule_case_ignore_ia5_substrings, &ldcf_rule_case_ignore_list_substrings}};
 constexpr rule_list ignoring_ordering{{&ldcf_rule_case_ignore_ordering}};
 
 bool holds(const oid_list& list, const csgl_string& oid)
@@ -210,15 +204,17 @@ int ldcf_attrtype_::check_match_rules() const
     switch (found.result) {
     case verdict::suitable: return 0;
     case verdict::inconsistent:
-        debug_trace("Attribute:%s has inconsistent matching rules for case-sensitivity. EQUALITY:%s SUBSTR:%s ORDERING:%s "
-                    "for syntax:%s\n",
-                    primary_name_.c_str(), equality_.c_str(), substr_.c_str(), ordering_.c_str(), syntax_oid_.c_str());
+        debug_trace(
+            "Attribute:%s has inconsistent matching rules for case-sensitivity. EQUALITY:%s SUBSTR:%s ORDERING:%s "
+            "for syntax:%s\n",
+            primary_name_.c_str(), equality_.c_str(), substr_.c_str(), ordering_.c_str(), syntax_oid_.c_str());
         PrintMessage(MSG_COMPONENT_SCHEMA, MSG_WARNING, LDCF_MSG_RULE_INCONSISTENT, found.label, found.rule->c_str(),
                      primary_name_.c_str());
         break;
     case verdict::invalid:
-        debug_trace("Attribute:%s has one or more invalid matching rules EQUALITY:%s SUBSTR:%s ORDERING:%s for syntax:%s\n",
-                    primary_name_.c_str(), equality_.c_str(), substr_.c_str(), ordering_.c_str(), syntax_oid_.c_str());
+        debug_trace(
+            "Attribute:%s has one or more invalid matching rules EQUALITY:%s SUBSTR:%s ORDERING:%s for syntax:%s\n",
+            primary_name_.c_str(), equality_.c_str(), substr_.c_str(), ordering_.c_str(), syntax_oid_.c_str());
         if (!other) {
             PrintMessage(MSG_COMPONENT_SCHEMA, MSG_WARNING, LDCF_MSG_RULE_INVALID, found.label, found.rule->c_str(),
                          primary_name_.c_str(), syntax_oid_.c_str());

@@ -30,8 +30,8 @@ T ldcf_find(const ldcf_map_name_to<T>& map, const csgl_string& name)
     return found == map.end() ? T() : found->second;
 }
 
-// Enters a handle under its OID and every name, all or none: a key that the map holds already keeps its handle, and when
-// memory runs out the map is as it was.
+// Enters a handle under its OID and every name, all or none: a key that the map holds already keeps its handle, and
+// when memory runs out the map is as it was.
 template <typename T>
 void ldcf_enter(ldcf_map_name_to<T>& map, const csgl_string& oid, const ldcf_names& names, const T& handle)
 {
@@ -74,8 +74,9 @@ csgl_set<T> ldcf_translate(const ldcf_translation<T>& translation, const csgl_se
 
 // A text form that is built when it is first asked for, by any reader.
 //
-// Readers may ask at the same time: each that finds nothing builds the text for itself, and the first to finish keeps it.
-// Once kept it doesn't move until clear, which belongs to whoever may change the definition. Copying copies what is kept.
+// Readers may ask at the same time: each that finds nothing builds the text for itself, and the first to finish keeps
+// it. Once kept it doesn't move until clear, which belongs to whoever may change the definition. Copying copies what is
+// kept.
 class DIRBASE_EXPORT ldcf_text_cache {
 public:
     ldcf_text_cache() = default;

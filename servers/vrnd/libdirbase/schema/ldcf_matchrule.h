@@ -48,9 +48,9 @@ class DIRBASE_EXPORT ldcf_matchrule : public csgl_refcounted_pointer_to<ldcf_mat
 public:
     using csgl_refcounted_pointer_to::csgl_refcounted_pointer_to;
 
-    // Reads "( oid {NAME qdescrs | DESC qdstring | OBSOLETE | SYNTAX qnoid} )", the items in any order and the last of a
-    // kind counting, and enters it under its oid and every name. Raises the exceptions of the token layer, after which the
-    // map is as it was; an oid or name that the map holds and a missing SYNTAX are exc_invalid_grammar_t.
+    // Reads "( oid {NAME qdescrs | DESC qdstring | OBSOLETE | SYNTAX qnoid} )", the items in any order and the last of
+    // a kind counting, and enters it under its oid and every name. Raises the exceptions of the token layer, after
+    // which the map is as it was; an oid or name that the map holds and a missing SYNTAX are exc_invalid_grammar_t.
     static void parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_matchrule>& map);
 
     const csgl_string& oid() const { return get()->oid(); }

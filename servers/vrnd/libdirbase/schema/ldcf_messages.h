@@ -49,9 +49,9 @@ enum ldcf_message_id : int {
     LDCF_MSG_ENCRYPTED_SPECIAL = -44,
     LDCF_MSG_ENCRYPTED_PASSWORD = -47,
 
-    LDCF_MSG_ALREADY_EXISTS = static_cast<int>(0xbffbffe1),       // 31 of catalogue 4
-    LDCF_MSG_DELETE_NOT_THERE = static_cast<int>(0xbffbffe6),     // 26 of catalogue 4
-    LDCF_MSG_REPLACE_NOT_THERE = static_cast<int>(0xbffbffe5),    // 27 of catalogue 4
+    LDCF_MSG_ALREADY_EXISTS = static_cast<int>(0xbffbffe1),     // 31 of catalogue 4
+    LDCF_MSG_DELETE_NOT_THERE = static_cast<int>(0xbffbffe6),   // 26 of catalogue 4
+    LDCF_MSG_REPLACE_NOT_THERE = static_cast<int>(0xbffbffe5),  // 27 of catalogue 4
 
     // Written with PrintMessage, not raised.
     LDCF_MSG_PROTECTION_CHANGED = 45,

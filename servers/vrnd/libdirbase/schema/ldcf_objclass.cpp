@@ -12,8 +12,9 @@ constexpr char implied_superclass[] = "top";
 
 [[noreturn]] void throw_duplicate(ldcf_token_factory& factory, const csgl_string& key)
 {
-    factory.throw_exc(ldcf_join("duplicate definition of [p[" LDCF_KIND_OBJECT_CLASS "]p] ", ldcf_quoted_parameter(key)),
-                      LDCF_MSG_DUPLICATE);
+    factory.throw_exc(
+        ldcf_join("duplicate definition of [p[" LDCF_KIND_OBJECT_CLASS "]p] ", ldcf_quoted_parameter(key)),
+        LDCF_MSG_DUPLICATE);
 }
 
 const char* kind_form(ldcf_objclass_kind kind)

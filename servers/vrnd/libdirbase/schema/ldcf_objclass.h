@@ -1,8 +1,8 @@
 // Object classes (RFC 4512, section 4.1.1). The shape is that of ldcf_syntax.h.
 //
-// Completion flattens the tree: a complete class knows all its ancestors and descendants and every attribute type that it
-// requires or permits, its own and inherited alike, so that nobody else walks SUP. There is no extended definition: the
-// extended text form says nothing beyond the oid.
+// Completion flattens the tree: a complete class knows all its ancestors and descendants and every attribute type that
+// it requires or permits, its own and inherited alike, so that nobody else walks SUP. There is no extended definition:
+// the extended text form says nothing beyond the oid.
 #pragma once
 
 #include "servers/vrnd/libdirbase/schema/ldcf_attrtype.h"
@@ -24,8 +24,8 @@ enum class ldcf_objclass_state : int {
     complete = 3,     // the sets are valid
 };
 
-// The most ancestors that a class may have. The flat sets grow with the square of a chain's length, so a schema with more
-// would only serve to exhaust the server.
+// The most ancestors that a class may have. The flat sets grow with the square of a chain's length, so a schema with
+// more would only serve to exhaust the server.
 constexpr std::size_t ldcf_superclass_limit = 1000;
 
 class DIRBASE_EXPORT ldcf_objclass : public csgl_refcounted_pointer_to<ldcf_objclass_> {
@@ -82,9 +82,9 @@ public:
     // True when the inherited form has something to say.
     bool v3_inherited() const;
 
-    // Links the class, after its superclasses, to all that it refers to. Raises exc_invalid_input_t for what is missing,
-    // for a cycle and for more than ldcf_superclass_limit ancestors; the classes on the chain then stay unfinished, and
-    // incomplete must run on all before another try (else exc_invalid_state_t).
+    // Links the class, after its superclasses, to all that it refers to. Raises exc_invalid_input_t for what is
+    // missing, for a cycle and for more than ldcf_superclass_limit ancestors; the classes on the chain then stay
+    // unfinished, and incomplete must run on all before another try (else exc_invalid_state_t).
     void complete(const ldcf_map_name_to<ldcf_objclass>& classes, const ldcf_map_name_to<ldcf_attrtype>& attributes);
 
     // Drops what complete made.
@@ -124,9 +124,27 @@ private:
     ldcf_objclass_state state_ = ldcf_objclass_state::parsed;
 };
 
-inline const csgl_string& ldcf_objclass::oid() const { return get()->oid(); }
-inline const csgl_string& ldcf_objclass::name() const { return get()->name(); }
-inline const csgl_string& ldcf_objclass::v3_string() const { return get()->v3_string(); }
-inline const csgl_string& ldcf_objclass::v3_string_inherited() const { return get()->v3_string_inherited(); }
-inline const csgl_string& ldcf_objclass::xan_string() const { return get()->xan_string(); }
-inline void ldcf_objclass::v3_file(const csgl_string& file) { get()->v3_file_ = file; }
+inline const csgl_string& ldcf_objclass::oid() const
+{
+    return get()->oid();
+}
+inline const csgl_string& ldcf_objclass::name() const
+{
+    return get()->name();
+}
+inline const csgl_string& ldcf_objclass::v3_string() const
+{
+    return get()->v3_string();
+}
+inline const csgl_string& ldcf_objclass::v3_string_inherited() const
+{
+    return get()->v3_string_inherited();
+}
+inline const csgl_string& ldcf_objclass::xan_string() const
+{
+    return get()->xan_string();
+}
+inline void ldcf_objclass::v3_file(const csgl_string& file)
+{
+    get()->v3_file_ = file;
+}

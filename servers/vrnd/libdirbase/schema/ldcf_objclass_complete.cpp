@@ -6,7 +6,8 @@
 namespace {
 
 template <typename T>
-T find_reference(const ldcf_map_name_to<T>& map, const csgl_string& text, const char* kind, const csgl_string& class_name)
+T find_reference(const ldcf_map_name_to<T>& map, const csgl_string& text, const char* kind,
+                 const csgl_string& class_name)
 {
     const T found = ldcf_find(map, text);
     if (!found) {
@@ -133,6 +134,7 @@ void ldcf_objclass_::finish()
     for (const ldcf_objclass& superclass : superclasses_) {
         superclass->subclasses_.insert(ldcf_objclass(this));
     }
+    v3_string_inherited_.clear();  // one asked for ahead of time
     state_ = ldcf_objclass_state::complete;
 }
 

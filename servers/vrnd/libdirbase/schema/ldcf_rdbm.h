@@ -15,8 +15,8 @@ public:
     //   access_class   the ACCESS-CLASS by number; attributes of class 4 (SYSTEM) live in the table of entries
     //   have_db_names  0 when the name is the attribute's own, else the number of names that the definition gives
     //
-    // A name of more than 128 characters is cut, with a message to the log. Raises exc_assertion_failed_t when the list of
-    // back ends (g_backends) holds none of the type that g_srvType asks for.
+    // A name of more than 128 characters is cut, with a message to the log. Raises exc_assertion_failed_t when the list
+    // of back ends (g_backends) holds none of the type that g_srvType asks for.
     static csgl_string normalize_table_name(const csgl_string& name, int access_class, int have_db_names);
 
     // The name of the column, at most 17 characters; a longer one is cut to 16, with a message to the log.
@@ -25,8 +25,8 @@ public:
 
 extern "C" {
 
-// Writes the lowest 35 bits of `value` as 7 digits of base 32 (0 to 9, A to V), highest first, and a terminating zero to
-// `out`, which has room for 8 bytes. Returns 0, or 1 when out is null.
+// Writes the lowest 35 bits of `value` as 7 digits of base 32 (0 to 9, A to V), highest first, and a terminating zero
+// to `out`, which has room for 8 bytes. Returns 0, or 1 when out is null.
 DIRBASE_EXPORT int unpack_int(std::uint64_t value, char* out);
 
 }  // extern "C"

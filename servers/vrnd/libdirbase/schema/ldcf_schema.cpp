@@ -1,5 +1,5 @@
-// The schema container: reading, linking, copying. Single definitions go in and out in ldcf_schema_change.cpp, the way to
-// disk is ldcf_schema_flush.cpp, the required definitions stand in ldcf_schema_check.cpp.
+// The schema container: reading, linking, copying. Single definitions go in and out in ldcf_schema_change.cpp, the way
+// to disk is ldcf_schema_flush.cpp, the required definitions stand in ldcf_schema_check.cpp.
 #include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
 
 #include "servers/vrnd/libcsgl/csgl_file.h"
@@ -20,7 +20,8 @@ constexpr section sections[] = {
     {"ldapSyntaxes", [](ldcf_schema& s, ldcf_token_factory& f) { ldcf_syntax::parse_v3(f, s.syntaxes); }},
     {"matchingRules", [](ldcf_schema& s, ldcf_token_factory& f) { ldcf_matchrule::parse_v3(f, s.matching_rules); }},
     {"attributeTypes", [](ldcf_schema& s, ldcf_token_factory& f) { ldcf_attrtype::parse_v3(f, s.attribute_types); }},
-    {"XANattributeTypes", [](ldcf_schema& s, ldcf_token_factory& f) { ldcf_attrtype::parse_xan(f, s.attribute_types); }},
+    {"XANattributeTypes",
+     [](ldcf_schema& s, ldcf_token_factory& f) { ldcf_attrtype::parse_xan(f, s.attribute_types); }},
     {"objectClasses", [](ldcf_schema& s, ldcf_token_factory& f) { ldcf_objclass::parse_v3(f, s.object_classes); }},
 };
 
@@ -118,9 +119,8 @@ void ldcf_schema::complete_nocheck()
     ldcf_for_each_definition(attribute_types, [this](const ldcf_attrtype& attribute) {
         attribute->complete(attribute_types, matching_rules, syntaxes);
     });
-    ldcf_for_each_definition(object_classes, [this](const ldcf_objclass& objclass) {
-        objclass->complete(object_classes, attribute_types);
-    });
+    ldcf_for_each_definition(
+        object_classes, [this](const ldcf_objclass& objclass) { objclass->complete(object_classes, attribute_types); });
 }
 
 void ldcf_schema::incomplete() noexcept

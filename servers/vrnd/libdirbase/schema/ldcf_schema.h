@@ -1,7 +1,7 @@
 // One whole schema: its definitions under every name they answer to, and the files that they belong to.
 //
-// Two instances live as long as the process. One is the active schema that every look-up reads; the other is empty except
-// while a change is voted on. A change is made on a copy in the second and takes effect by moving one pointer
+// Two instances live as long as the process. One is the active schema that every look-up reads; the other is empty
+// except while a change is voted on. A change is made on a copy in the second and takes effect by moving one pointer
 // (ldcf_schema_modify.h), so readers never see half of it.
 //
 // A schema file is a sequence of sections: a keyword (ldapSyntaxes, matchingRules, attributeTypes, XANattributeTypes,
@@ -32,8 +32,8 @@ public:
     ldcf_schema(const ldcf_schema&) = delete;
     ldcf_schema& operator=(const ldcf_schema&) = delete;
 
-    // Reads a whole schema file, which becomes current_file. A failure inside its text leaves the definitions read so far,
-    // and `files` and current_file as they were; a file that is shorter than it claimed is exc_end_of_input_t.
+    // Reads a whole schema file, which becomes current_file. A failure inside its text leaves the definitions read so
+    // far, and `files` and current_file as they were; a file that is shorter than it claimed is exc_end_of_input_t.
     void parse(const char* file);
 
     // Reads schema text, zero-terminated. `file` names it in messages and becomes the home of the definitions.
@@ -57,22 +57,23 @@ public:
     // Makes this empty schema a deep copy of another, which stays as it is.
     ldcf_schema& copy(const ldcf_schema& from);
 
-    // Take a definition in: it is homed in current_file and linked. An oid or name that exists is exc_ldap_rc_t with 20.
+    // Take a definition in: it is homed in current_file and linked. An oid or name that exists is exc_ldap_rc_t with
+    // 20.
     void insert(ldcf_syntax& definition);
     void insert(ldcf_matchrule& definition);
     void insert(ldcf_attrtype& definition);
     void insert(ldcf_objclass& definition);
 
-    // Take the definition out that has the oid of the given one, which may be any parsed definition. An oid or name that
-    // doesn't exist is exc_ldap_rc_t with 16, names of another definition are exc_invalid_input_t, and a definition that
-    // others use is exc_invalid_state_t.
+    // Take the definition out that has the oid of the given one, which may be any parsed definition. An oid or name
+    // that doesn't exist is exc_ldap_rc_t with 16, names of another definition are exc_invalid_input_t, and a
+    // definition that others use is exc_invalid_state_t.
     void erase(ldcf_syntax& definition);
     void erase(ldcf_matchrule& definition);
     void erase(ldcf_attrtype& definition);
     void erase(ldcf_objclass& definition);
 
-    // Let the definition with this oid say what the given one says, in its place and its home files. An oid that doesn't
-    // exist is exc_ldap_rc_t with 16, a name of another definition exc_invalid_input_t.
+    // Let the definition with this oid say what the given one says, in its place and its home files. An oid that
+    // doesn't exist is exc_ldap_rc_t with 16, a name of another definition exc_invalid_input_t.
     void replace(ldcf_syntax& definition);
     void replace(ldcf_matchrule& definition);
     void replace(ldcf_attrtype& definition);
@@ -82,8 +83,8 @@ public:
     void flush() const;
     void flush(const csgl_string& file) const;
 
-    // Put the temporary files in the place of the modified files. When one can't be, those already replaced are put back
-    // and the failure is raised; all stay marked modified.
+    // Put the temporary files in the place of the modified files. When one can't be, those already replaced are put
+    // back and the failure is raised; all stay marked modified.
     void flush_commit();
 
     // Removes the temporary files of the modified files, which count as flushed then. A missing one is passed over; of

@@ -6,10 +6,22 @@ namespace {
 constexpr int result_no_such_attribute = 16;
 constexpr int result_type_or_value_exists = 20;
 
-const char* kind_of(const ldcf_syntax&) { return LDCF_KIND_SYNTAX; }
-const char* kind_of(const ldcf_matchrule&) { return LDCF_KIND_MATCHING_RULE; }
-const char* kind_of(const ldcf_attrtype&) { return LDCF_KIND_ATTRIBUTE_TYPE; }
-const char* kind_of(const ldcf_objclass&) { return LDCF_KIND_OBJECT_CLASS; }
+const char* kind_of(const ldcf_syntax&)
+{
+    return LDCF_KIND_SYNTAX;
+}
+const char* kind_of(const ldcf_matchrule&)
+{
+    return LDCF_KIND_MATCHING_RULE;
+}
+const char* kind_of(const ldcf_attrtype&)
+{
+    return LDCF_KIND_ATTRIBUTE_TYPE;
+}
+const char* kind_of(const ldcf_objclass&)
+{
+    return LDCF_KIND_OBJECT_CLASS;
+}
 
 // "[p[kind]p] [p['key']p] <fault>"
 csgl_string about(const char* kind, const csgl_string& key, const char* fault)
@@ -60,10 +72,22 @@ void home(T& definition, const csgl_string& file)
 
 // The references to a stored definition that the schema's own structure explains, beside its keys and the one that the
 // erasing operation holds: its entries among its relatives.
-int relatives(const ldcf_syntax&) { return 0; }
-int relatives(const ldcf_matchrule&) { return 0; }
-int relatives(const ldcf_attrtype& attribute) { return attribute->supertype() ? 1 : 0; }
-int relatives(const ldcf_objclass& objclass) { return static_cast<int>(objclass->superclasses().size()); }
+int relatives(const ldcf_syntax&)
+{
+    return 0;
+}
+int relatives(const ldcf_matchrule&)
+{
+    return 0;
+}
+int relatives(const ldcf_attrtype& attribute)
+{
+    return attribute->supertype() ? 1 : 0;
+}
+int relatives(const ldcf_objclass& objclass)
+{
+    return static_cast<int>(objclass->superclasses().size());
+}
 
 // An oid among the names of an attribute type or class takes one key for both.
 template <typename T>
@@ -71,7 +95,10 @@ int shared_keys(const T& definition)
 {
     return definition->names().count(definition.oid()) != 0 ? 1 : 0;
 }
-int shared_keys(const ldcf_matchrule&) { return 0; }
+int shared_keys(const ldcf_matchrule&)
+{
+    return 0;
+}
 
 void leave_relatives(const ldcf_syntax&) {}
 void leave_relatives(const ldcf_matchrule&) {}
@@ -119,8 +146,8 @@ T erase_from(ldcf_map_name_to<T>& map, const T& given)
     const int count = found->value();
     if (count != expected) {
         const csgl_string text =
-            ldcf_join(about(kind_of(found), found.oid(), " can not be deleted; its refcount is [p["), ldcf_number(count),
-                      "]p].  It should be [p[", ldcf_number(expected), "]p]");
+            ldcf_join(about(kind_of(found), found.oid(), " can not be deleted; its refcount is [p["),
+                      ldcf_number(count), "]p].  It should be [p[", ldcf_number(expected), "]p]");
         throw exc_invalid_state_t(__FILE__, __LINE__, text.c_str(), LDCF_MSG_IN_USE);
     }
     leave_relatives(found);
@@ -217,7 +244,7 @@ void ldcf_schema::replace_in(const char* kind, T& definition, Map& map)
         }
     }
     for (const csgl_string& name : found->names()) {
-        if (definition->names().count(name) == 0) {
+        if (definition->names().count(name) == 0 && csgl_str_ci_compare(name, found.oid()) != 0) {
             map.erase(name);
         }
     }

@@ -7,6 +7,7 @@ namespace {
 #define SYNTAX(last_arc, description) "( " LDCF_SYNTAX_ARC last_arc " DESC '" description "' )"
 #define RULE(oid, name, last_arc) "( " oid " NAME '" name "' SYNTAX " LDCF_SYNTAX_ARC last_arc " )"
 
+// clang-format off
 // RFC 4517, sections 3.3 and 4.2; the older syntaxes and rules from RFC 2252 and RFC 2256; the server's own.
 constexpr char required_definitions[] =
     "objectclasses {} attributetypes {} xanattributetypes {} ldapSyntaxes {"
@@ -86,6 +87,7 @@ constexpr char required_definitions[] =
     RULE("2.5.13.23", "uniqueMemberMatch", "34")
     RULE("2.5.13.24", "protocolInformationMatch", "42")
     "}";
+// clang-format on
 
 #undef SYNTAX
 #undef RULE
@@ -110,8 +112,14 @@ bool inherits(const T&)
 {
     return false;
 }
-bool inherits(const ldcf_attrtype& attribute) { return attribute->v3_inherited(); }
-bool inherits(const ldcf_objclass& objclass) { return objclass->v3_inherited(); }
+bool inherits(const ldcf_attrtype& attribute)
+{
+    return attribute->v3_inherited();
+}
+bool inherits(const ldcf_objclass& objclass)
+{
+    return objclass->v3_inherited();
+}
 
 csgl_string parameter(const csgl_string& text)
 {
@@ -129,12 +137,12 @@ void match_one(const char* kind, const T& required, const T& found)
     const csgl_string about = ldcf_join("[p[", kind, "]p] ", ldcf_quoted_parameter(required.name()));
     if (!found.v3_syntax_equal(required)) {
         if (inherits(required) || inherits(found)) {
-            throw_differs(
-                ldcf_join(" Error ", about, " must be provided as ", parameter(required.v3_string()),
-                          " with inherited properties or XAN extensions ", parameter(required.v3_string_inherited()),
-                          " was provided as ", parameter(found.v3_string()),
-                          " with inherited properties or XAN extensions ", parameter(found.v3_string_inherited())),
-                LDCF_MSG_REQUIRED_INHERITED_DIFFERS);
+            throw_differs(ldcf_join(" Error ", about, " must be provided as ", parameter(required.v3_string()),
+                                    " with inherited properties or XAN extensions ",
+                                    parameter(required.v3_string_inherited()), " was provided as ",
+                                    parameter(found.v3_string()), " with inherited properties or XAN extensions ",
+                                    parameter(found.v3_string_inherited())),
+                          LDCF_MSG_REQUIRED_INHERITED_DIFFERS);
         }
         throw_differs(ldcf_join(" Error ", about, " must be provided as ", parameter(required.v3_string()),
                                 " was provided as ", parameter(found.v3_string())),

@@ -37,9 +37,9 @@ void remove_if_there(const csgl_string& file)
     }
 }
 
-// The old content of one schema file, kept under a second name while the new content takes its place. Unless the change is
-// kept, the destructor puts it back. The second name is built on that of the temporary file, which is the server's own, so
-// that no copy of the administrator's is in its way.
+// The old content of one schema file, kept under a second name while the new content takes its place. Unless the change
+// is kept, the destructor puts it back. The second name is built on that of the temporary file, which is the server's
+// own, so that no copy of the administrator's is in its way.
 class replaced_file {
 public:
     explicit replaced_file(const csgl_string& file) : file_(file), backup_(temporary_of(file) + ".old")

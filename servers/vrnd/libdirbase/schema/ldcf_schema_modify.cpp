@@ -16,6 +16,9 @@ ldcf_schema* ldcf_schema_proposed_g = nullptr;
 
 namespace {
 
+// True from a vote that went through until the commit or the cleanup: only then is there something to commit.
+bool voted = false;
+
 ldcf_schema& spare_schema()
 {
     return ldcf_schema_g == &schemas[0] ? schemas[1] : schemas[0];
@@ -24,6 +27,7 @@ ldcf_schema& spare_schema()
 template <typename T>
 void vote(ldcf_modify_op op, T& definition)
 {
+    voted = false;
     ldcf_schema& proposed = spare_schema();
     ldcf_schema_proposed_g = &proposed;
     proposed.clear();  // a change that was never cleaned up must not shine through
@@ -34,21 +38,22 @@ void vote(ldcf_modify_op op, T& definition)
     case ldcf_modify_replace: proposed.replace(definition); break;
     default:
         throw exc_invalid_parameter_t(
-            __FILE__, __LINE__,
-            "invalid op value; Expected one of the following operation: [p[add, delete, replace]p]",
+            __FILE__, __LINE__, "invalid op value; Expected one of the following operation: [p[add, delete, replace]p]",
             LDCF_MSG_INVALID_OPERATION);
     }
     proposed.check();
     proposed.flush();
+    voted = true;
 }
 
 void commit()
 {
-    if (ldcf_schema_proposed_g == nullptr) {
-        throw exc_invalid_state_t(__FILE__, __LINE__, "exc_invalid_state", 0);  // nothing was voted on yet
+    if (!voted) {
+        throw exc_invalid_state_t(__FILE__, __LINE__, "exc_invalid_state", 0);
     }
     ldcf_schema_proposed_g->flush_commit();
     ldcf_schema_g = ldcf_schema_proposed_g;
+    voted = false;
 }
 
 void cleanup()
@@ -56,6 +61,7 @@ void cleanup()
     struct empty_spare {
         ~empty_spare() { spare_schema().clear(); }
     } whatever_happens;
+    voted = false;
 
     if (ldcf_schema_proposed_g != nullptr && ldcf_schema_proposed_g != ldcf_schema_g) {
         ldcf_schema_proposed_g->flush_rollback();
@@ -139,7 +145,8 @@ int ldcf_schema_modify_syntax(Backend* /*be*/, ldcf_modify_op op, ldcf_modify_ph
     return ldcf_schema_modify(op, phase, definition);
 }
 
-int ldcf_schema_modify_matchrule(Backend* /*be*/, ldcf_modify_op op, ldcf_modify_phase phase, ldcf_matchrule& definition)
+int ldcf_schema_modify_matchrule(Backend* /*be*/, ldcf_modify_op op, ldcf_modify_phase phase,
+                                 ldcf_matchrule& definition)
 {
     return ldcf_schema_modify(op, phase, definition);
 }

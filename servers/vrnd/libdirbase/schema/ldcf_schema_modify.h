@@ -34,8 +34,8 @@ extern "C" {
 // Run one phase of a change of one definition, the same in all phases. An added definition becomes part of the schema;
 // one to delete or replace is given as parsed. Return 0, or -1 for a phase outside the four. The back end isn't used.
 //
-// A replaced attribute type whose protection (encryption, returned value, secure connection, matching) changes is told to
-// the message log after the commit.
+// A replaced attribute type whose protection (encryption, returned value, secure connection, matching) changes is told
+// to the message log after the commit.
 DIRBASE_EXPORT int ldcf_schema_modify_syntax(Backend* be, ldcf_modify_op op, ldcf_modify_phase phase,
                                              ldcf_syntax& definition);
 DIRBASE_EXPORT int ldcf_schema_modify_matchrule(Backend* be, ldcf_modify_op op, ldcf_modify_phase phase,

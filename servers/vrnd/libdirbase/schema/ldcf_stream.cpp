@@ -48,7 +48,8 @@ ldcf_names ldcf_stream::oids(ldcf_token_factory& factory)
     }
     result.insert(token.text());
     for (;;) {
-        token.assign(factory, LDCF_EXPECTED_ONE_OF("'$' ')'"), token_dollar | token_right_paren, LDCF_MSG_EXPECTED_ONE_OF);
+        token.assign(factory, LDCF_EXPECTED_ONE_OF("'$' ')'"), token_dollar | token_right_paren,
+                     LDCF_MSG_EXPECTED_ONE_OF);
         if (token[token_right_paren]) {
             return result;
         }
@@ -96,7 +97,8 @@ int ldcf_stream::number(const ldcf_token& token)
 
 csgl_string ldcf_stream::qdstring(ldcf_token_factory& factory)
 {
-    return ldcf_token(factory, "expected qdstring" LDCF_NOT_FOUND_AT, token_qdstring, LDCF_MSG_EXPECTED_QDSTRING).text();
+    return ldcf_token(factory, "expected qdstring" LDCF_NOT_FOUND_AT, token_qdstring, LDCF_MSG_EXPECTED_QDSTRING)
+        .text();
 }
 
 csgl_vector<csgl_string> ldcf_stream::qdstrings(ldcf_token_factory& factory)

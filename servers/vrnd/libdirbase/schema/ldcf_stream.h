@@ -1,7 +1,7 @@
 // Readers of the small productions of the schema grammar, and printers that undo them (RFC 4512, section 4.1).
 //
-// A reader consumes tokens and returns what it read; a failure is an exception of the token layer whose text says what was
-// expected (ldcf_token.h).
+// A reader consumes tokens and returns what it read; a failure is an exception of the token layer whose text says what
+// was expected (ldcf_token.h).
 #pragma once
 
 #include "servers/vrnd/libdirbase/schema/ldcf_common.h"
@@ -29,8 +29,8 @@ DIRBASE_EXPORT csgl_vector<csgl_string> qdstrings(ldcf_token_factory& factory);
 DIRBASE_EXPORT csgl_string descr(ldcf_token_factory& factory);
 DIRBASE_EXPORT csgl_string qdescr(ldcf_token_factory& factory);
 
-// One quoted name, or a list of at least one between parentheses; the first one goes to `primary`. Names that differ only
-// in case count once.
+// One quoted name, or a list of at least one between parentheses; the first one goes to `primary`. Names that differ
+// only in case count once.
 DIRBASE_EXPORT ldcf_names qdescrs(ldcf_token_factory& factory, csgl_string& primary);
 
 // The number that a token of digits stands for; one too large for an int is the largest int.

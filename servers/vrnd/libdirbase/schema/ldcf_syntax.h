@@ -1,8 +1,9 @@
 // Syntaxes: what the values of an attribute look like (RFC 4512, section 4.1.5).
 //
-// The four kinds of definition share one shape: a handle over a counted body whose name ends in "_". Many maps and other
-// definitions hold handles on one body, and a change made through one is seen by all. Definitions are built and changed by
-// one thread, on a schema that no reader sees; a published definition is only read, by any number of threads.
+// The four kinds of definition share one shape: a handle over a counted body whose name ends in "_". Many maps and
+// other definitions hold handles on one body, and a change made through one is seen by all. Definitions are built and
+// changed by one thread, on a schema that no reader sees; a published definition is only read, by any number of
+// threads.
 //
 // A definition is read from text (parse_v3), linked to what it refers to (complete), and served; incomplete unlinks it.
 // Two text forms exist: the standard one, and the extended one that holds what the server adds.
@@ -45,8 +46,8 @@ class DIRBASE_EXPORT ldcf_syntax : public csgl_refcounted_pointer_to<ldcf_syntax
 public:
     using csgl_refcounted_pointer_to::csgl_refcounted_pointer_to;
 
-    // Reads "( oid [DESC qdstring] )" and enters it under its oid. Raises the exceptions of the token layer, after which
-    // the map is as it was; an oid that the map holds is exc_invalid_grammar_t.
+    // Reads "( oid [DESC qdstring] )" and enters it under its oid. Raises the exceptions of the token layer, after
+    // which the map is as it was; an oid that the map holds is exc_invalid_grammar_t.
     static void parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_syntax>& map);
 
     const csgl_string& oid() const { return get()->oid(); }

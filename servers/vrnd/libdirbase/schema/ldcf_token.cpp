@@ -263,7 +263,8 @@ void ldcf_token::read_quoted(ldcf_token_factory& factory)
     ldcf_token_type type = classes.is_first_descr[byte_at(cursor)] ? token_qdescr : token_qdstring;
     for (; *cursor != '\''; ++cursor) {
         if (*cursor == '\0') {
-            factory.raise<exc_unexpected_end_of_input_t>("non-terminated quoted string " LDCF_SPOT, LDCF_MSG_OPEN_QUOTE);
+            factory.raise<exc_unexpected_end_of_input_t>("non-terminated quoted string " LDCF_SPOT,
+                                                         LDCF_MSG_OPEN_QUOTE);
         }
         if (!classes.is_middle_descr[byte_at(cursor)]) {
             type = token_qdstring;

@@ -1,7 +1,7 @@
 // The lexical layer of schema text (the definitions of RFC 4512, section 4.1, and the server's own around them).
 //
-// A factory walks a text of the caller's in place; a token is one lexical item, copied out. Every fault is an exception whose
-// place is the source's name and current line, with an excerpt of the text in its message.
+// A factory walks a text of the caller's in place; a token is one lexical item, copied out. Every fault is an exception
+// whose place is the source's name and current line, with an excerpt of the text in its message.
 #pragma once
 
 #include "servers/vrnd/libcsgl/csgl_string.h"
@@ -26,8 +26,8 @@ enum ldcf_token_type : unsigned {
 
 class DIRBASE_EXPORT ldcf_token_factory {
 public:
-    // One pass over `buffer`, a zero-terminated text that stays with the caller and unchanged while it is read. `file` names
-    // the source in every exception; it may be empty for text that doesn't come from a file.
+    // One pass over `buffer`, a zero-terminated text that stays with the caller and unchanged while it is read. `file`
+    // names the source in every exception; it may be empty for text that doesn't come from a file.
     ldcf_token_factory(const char* buffer, const csgl_string& file);
 
     // Starts another pass.
@@ -85,8 +85,8 @@ public:
     const csgl_string& text() const { return text_; }
     ldcf_token_type type() const { return type_; }
 
-    // True when the token meets the mask. A mask for a dotted oid also admits a number, and one for any quoted text also
-    // admits a quoted name.
+    // True when the token meets the mask. A mask for a dotted oid also admits a number, and one for any quoted text
+    // also admits a quoted name.
     bool operator[](unsigned mask) const;
 
     // True when the token's text is `keyword`, without regard to case.

@@ -108,10 +108,9 @@ ldcf_attr_identity ldcf_identify_attribute(const csgl_string& v3_file, const csg
     if (csgl_str_ci_compare(base_name, configuration_file) == 0) {
         return {-1, ldcf_attr_class_configuration};
     }
-    const auto* found =
-        std::lower_bound(std::begin(attributes), std::end(attributes), name, [](const well_known& known, const char* text) {
-            return csgl_str_ci_compare(known.name, text) < 0;
-        });
+    const auto* found = std::lower_bound(
+        std::begin(attributes), std::end(attributes), name,
+        [](const well_known& known, const char* text) { return csgl_str_ci_compare(known.name, text) < 0; });
     if (found != std::end(attributes) && csgl_str_ci_compare(found->name, name) == 0) {
         return found->identity;
     }

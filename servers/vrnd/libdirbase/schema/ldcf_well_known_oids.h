@@ -1,5 +1,5 @@
-// OIDs of the syntaxes, and OIDs and names of the matching rules, that the server treats by name (RFC 4517, section 3.3 and
-// 4.2; a few older ones from RFC 2252 and RFC 2256).
+// OIDs of the syntaxes, and OIDs and names of the matching rules, that the server treats by name (RFC 4517, section 3.3
+// and 4.2; a few older ones from RFC 2252 and RFC 2256).
 #pragma once
 
 #define LDCF_SYNTAX_ARC "1.3.6.1.4.1.1466.115.121.1."

@@ -73,7 +73,8 @@ TEST(File, ReadsWritesAndMovesWithinItsAccess)
     csgl_file file = open_file(path, 2, 3);
     EXPECT_EQ(file.seek(-3, csgl_file_from_end), 7u);
     EXPECT_EQ(file.read(bytes, sizeof(bytes)), 3u);
-    // The largest size, at the end of the file. On the stack so large a buffer could end beyond the address space: EFAULT.
+    // The largest size, at the end of the file. On the stack so large a buffer could end beyond the address space:
+    // EFAULT.
     EXPECT_EQ(file.read(std::make_unique<char[]>(32).get(), INT_MAX), 0u);
     EXPECT_EQ(file.seek(-4, csgl_file_from_here), 6u);
 
