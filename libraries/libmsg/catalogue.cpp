@@ -27,6 +27,7 @@ constexpr bool operator<(const catalogue_entry& a, const catalogue_entry& b)
 
 constexpr catalogue_entry catalogue[] = {
     {MSG_COMPONENT_SERVER, 7, "The server is out of memory."},
+    {MSG_COMPONENT_SERVER, 106, "A tree of the server is damaged: %1$s."},
 
     {MSG_COMPONENT_SCHEMA, 1, AT_PLACE "expected %3$s, but could not find it at or before %4$s"},
     {MSG_COMPONENT_SCHEMA, 2, AT_PLACE "expected one of the following: %3$s, but could not find it at or before %4$s"},
@@ -85,6 +86,8 @@ constexpr catalogue_entry catalogue[] = {
     {MSG_COMPONENT_SCHEMA, 49,
      "The %1$s matching rule %2$s of attribute %3$s differs from its EQUALITY matching rule in case sensitivity."},
 
+    {MSG_COMPONENT_RDBM, 28, "The conversion between UTF-8 and the local code page %1$s is not available."},
+    {MSG_COMPONENT_RDBM, 29, "A text could not be converted between UTF-8 and the local code page."},
     {MSG_COMPONENT_RDBM, 30, "The table name %1$s is too long for the store and has been cut to %2$s."},
     {MSG_COMPONENT_RDBM, 31, "The column name %1$s is too long for the store and has been cut to %2$s."},
     {MSG_COMPONENT_RDBM, 32, "The generated table name %1$s is too long for the store and has been replaced by %2$s."},

@@ -1,6 +1,7 @@
 // The public headers of libdirbase: what a caller, a plug-in or a test from outside includes first.
 #pragma once
 
+#include "libraries/libavl/avl.h"
 #include "servers/vrnd/libcsgl/csgl_exception.h"
 #include "servers/vrnd/libcsgl/csgl_file.h"
 #include "servers/vrnd/libcsgl/csgl_memory.h"
@@ -9,6 +10,13 @@
 #include "servers/vrnd/libcsgl/csgl_refcounted.h"
 #include "servers/vrnd/libcsgl/csgl_string.h"
 #include "servers/vrnd/libdirbase/base/backend.h"
+#include "servers/vrnd/libdirbase/base/charray.h"
+#include "servers/vrnd/libdirbase/base/code_page.h"
+#include "servers/vrnd/libdirbase/base/list.h"
+#include "servers/vrnd/libdirbase/base/lutil_uuid.h"
+#include "servers/vrnd/libdirbase/base/slapi_ch.h"
+#include "servers/vrnd/libdirbase/base/uni_case.h"
+#include "servers/vrnd/libdirbase/base/utf8_text.h"
 #include "servers/vrnd/libdirbase/locking/rdbm_lock.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_attrtype.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_matchrule.h"
