@@ -12,7 +12,7 @@ namespace fuzz_support {
 
 namespace {
 
-Backend relational_store{"rdbm", nullptr, nullptr, nullptr};
+Backend relational_store{"rdbm"};
 
 [[maybe_unused]] const bool prepared = [] {
     set_message_sink([](void*, const message_record&) {}, nullptr);

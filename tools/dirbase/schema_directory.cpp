@@ -68,7 +68,7 @@ std::string_view without_blanks(std::string_view line)
 // Table names depend on there being a relational back end. The tool has no store behind it, and needs none.
 void announce_relational_store()
 {
-    static Backend relational_store = {"rdbm", nullptr, nullptr, nullptr};
+    static Backend relational_store = {"rdbm"};
     g_backends = &relational_store;
 }
 

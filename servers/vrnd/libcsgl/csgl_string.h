@@ -121,12 +121,17 @@ struct csgl_str_quoted {
 // taken as signed, or 0.
 DIRBASE_EXPORT int csgl_str_ci_compare(const char* a, const char* b);
 
-// The order of all schema names and OIDs.
+// The order of all schema names and OIDs. Containers in this order can be asked for a plain text, without a copy of it.
 struct csgl_str_ci_less {
+    using is_transparent = void;
+
     bool operator()(const csgl_string& a, const csgl_string& b) const
     {
         return a.get() != b.get() && csgl_str_ci_compare(a.c_str(), b.c_str()) < 0;
     }
+    bool operator()(const csgl_string& a, const char* b) const { return csgl_str_ci_compare(a.c_str(), b) < 0; }
+    bool operator()(const char* a, const csgl_string& b) const { return csgl_str_ci_compare(a, b.c_str()) < 0; }
+    bool operator()(const char* a, const char* b) const { return csgl_str_ci_compare(a, b) < 0; }
 };
 
 // Fills `n` bytes at `p` with zero.

@@ -5,16 +5,22 @@
 
 #include "libraries/dirbase_export.h"
 
+struct asyntaxinfo;
+
 // Members are added as the library comes to need them, in their order. Texts and functions belong to whoever fills the
 // record; a function pointer may be null.
 struct Backend {
-    const char* be_type;  // "rdbm" for the relational store, "proxy", "ldcf" for the schema store
-    Backend* be_next;     // next on the list
+    const char* be_type = nullptr;  // "rdbm" for the relational store, "proxy", "ldcf" for the schema store
+    Backend* be_next = nullptr;     // next on the list
 
     // What stands in front of the names of a relational store's tables, for example their owner, and the table that
     // holds entry-level attributes. The texts stay with the back end.
-    const char* (*be_table_qualifier)(Backend* be);
-    const char* (*be_entry_table)(Backend* be);
+    const char* (*be_table_qualifier)(Backend* be) = nullptr;
+    const char* (*be_entry_table)(Backend* be) = nullptr;
+
+    // May add to the record of an attribute type that has just been made, before anybody else sees it. What it hangs on
+    // back_end_list is freed with the record.
+    void (*be_fill_attr_info)(asyntaxinfo* info) = nullptr;
 };
 
 extern "C" {

@@ -6,6 +6,7 @@
 #pragma once
 
 #include "servers/vrnd/libdirbase/schema/ldcf_matchrule.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_rdbm.h"
 
 class ldcf_attrtype;
 class ldcf_attrtype_;
@@ -105,6 +106,13 @@ public:
     const csgl_string& xan_string() const;
     void v3_file(const csgl_string& file);
     void xan_file(const csgl_string& file);
+
+    // The flat record, made when it is first asked for and owned by the type; null when it can't be made
+    // (ldcf_rdbm::fill_asyntaxinfo). Readers may ask at the same time.
+    asyntaxinfo* info() const;
+
+    // Drops the record, so that it is made anew, and empties the name cache. Readers must be kept out.
+    void reset_info() const;
 
     ldcf_attrtype clone() const;
     void replace(ldcf_attrtype& other);
@@ -227,6 +235,7 @@ private:
     void check_encryption();
     void append_store_form(csgl_string& text) const;
 
+    ldcf_lazy_record<asyntaxinfo, ldcf_rdbm::delete_asyntaxinfo> info_;
     csgl_string v3_file_;
     ldcf_text_cache v3_string_;
     ldcf_reader_flag inherited_asked_;
@@ -295,6 +304,14 @@ inline const csgl_string& ldcf_attrtype::v3_string_inherited() const
 inline const csgl_string& ldcf_attrtype::xan_string() const
 {
     return get()->xan_string();
+}
+inline asyntaxinfo* ldcf_attrtype::info() const
+{
+    return get()->info_.get([this] { return ldcf_rdbm::fill_asyntaxinfo(*this); });
+}
+inline void ldcf_attrtype::reset_info() const
+{
+    get()->info_.reset();
 }
 inline void ldcf_attrtype::xan_file(const csgl_string& file)
 {

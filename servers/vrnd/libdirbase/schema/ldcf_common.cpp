@@ -11,6 +11,12 @@ std::mutex text_cache_mutex;
 
 }  // namespace
 
+std::recursive_mutex& ldcf_record_mutex()
+{
+    static std::recursive_mutex mutex;
+    return mutex;
+}
+
 bool ldcf_names_equal(const ldcf_names& a, const ldcf_names& b)
 {
     if (a.size() != b.size()) {

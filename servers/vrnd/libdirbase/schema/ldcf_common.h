@@ -72,6 +72,9 @@ csgl_set<T> ldcf_translate(const ldcf_translation<T>& translation, const csgl_se
     return result;
 }
 
+// Held while a record of ldcf_lazy_record is made.
+DIRBASE_EXPORT std::recursive_mutex& ldcf_record_mutex();
+
 // A text form that is built when it is first asked for, by any reader.
 //
 // Readers may ask at the same time: each that finds nothing builds the text for itself, and the first to finish keeps
@@ -99,6 +102,51 @@ private:
 
     mutable csgl_string text_;
     mutable std::atomic<bool> filled_{false};
+};
+
+// A record that is made when it is first asked for, by any reader, and lives as long as the definition that holds it.
+//
+// Readers who find it take no lock. Those who don't take turns, so that each record is made once; a maker may ask for
+// other records. A record that couldn't be made is tried again by the next who asks. A copy of the definition makes a
+// record of its own, and a definition that is told to say something else drops its record.
+template <typename Record, void (*destroy)(Record*)>
+class ldcf_lazy_record {
+public:
+    ldcf_lazy_record() = default;
+    ldcf_lazy_record(const ldcf_lazy_record&) {}
+    ldcf_lazy_record& operator=(const ldcf_lazy_record&)
+    {
+        reset();
+        return *this;
+    }
+    ~ldcf_lazy_record() { reset(); }
+
+    // The record, or null when `make`, which gives a new record or null, can't make it.
+    template <typename Make>
+    Record* get(Make&& make) const
+    {
+        if (Record* made = record_.load(std::memory_order_acquire); made != nullptr) {
+            return made;
+        }
+        const std::lock_guard<std::recursive_mutex> guard(ldcf_record_mutex());
+        Record* record = record_.load(std::memory_order_relaxed);
+        if (record == nullptr) {
+            record = make();
+            record_.store(record, std::memory_order_release);
+        }
+        return record;
+    }
+
+    // Drops the record; no reader may hold it.
+    void reset()
+    {
+        if (Record* record = record_.exchange(nullptr, std::memory_order_acq_rel); record != nullptr) {
+            destroy(record);
+        }
+    }
+
+private:
+    mutable std::atomic<Record*> record_{nullptr};
 };
 
 // A flag that readers may raise at the same time.

@@ -44,6 +44,10 @@ public:
     const csgl_string& xan_string() const;
     void v3_file(const csgl_string& file);
 
+    // The flat record, made when it is first asked for and owned by the class; null when memory ran out. Readers may ask
+    // at the same time.
+    objectclassinfo* info() const;
+
     ldcf_objclass clone() const;
     void replace(ldcf_objclass& other);
 
@@ -103,6 +107,7 @@ private:
     void absorb(const ldcf_objclass& superclass);
     void finish();
 
+    ldcf_lazy_record<objectclassinfo, ldcf_rdbm::delete_objectclassinfo> info_;
     csgl_string v3_file_;
     ldcf_text_cache v3_string_;
     ldcf_reader_flag inherited_asked_;
@@ -143,6 +148,10 @@ inline const csgl_string& ldcf_objclass::v3_string_inherited() const
 inline const csgl_string& ldcf_objclass::xan_string() const
 {
     return get()->xan_string();
+}
+inline objectclassinfo* ldcf_objclass::info() const
+{
+    return get()->info_.get([this] { return ldcf_rdbm::fill_classinfo(*this); });
 }
 inline void ldcf_objclass::v3_file(const csgl_string& file)
 {

@@ -9,12 +9,13 @@
 #include "libraries/libmsg/message_log.h"
 #include "servers/vrnd/libcsgl/csgl_exception.h"
 #include "servers/vrnd/libdirbase/base/backend.h"
+#include "servers/vrnd/libdirbase/base/utf8_text.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_hash.h"
 
 namespace {
 
 constexpr unsigned table_name_limit = 128;
 constexpr unsigned hash_suffix_length = 7;
-constexpr std::uint32_t hash_slots = 7001;
 constexpr unsigned column_name_limit = 17;
 constexpr unsigned cut_column_length = 16;
 constexpr int access_class_system = 4;
@@ -33,43 +34,21 @@ constexpr std::string_view own_tables[] = {"xanEntryUuid", "CryptoSync", "Crypto
 csgl_string store_form(const csgl_string& name)
 {
     const unsigned length = name.length();
-    csgl_local_array_of<char> text(length + 1);
-    const auto fold = [](char c) {
-        if (c == '-') {
-            return '_';
-        }
-        return c >= 'a' && c <= 'z' ? static_cast<char>(c - 'a' + 'A') : c;
-    };
-    std::transform(name.c_str(), name.c_str() + length, text.get(), fold);
+    csgl_local_array_of<char> text(std::size_t{length} + 1);
+    std::memcpy(text.get(), name.c_str(), std::size_t{length} + 1);
+    utfToUpper(text.get());  // what isn't UTF-8 stays as it is from there on
     if (length > 0 && text[length - 1] == 'I') {
         text[length - 1] = 'X';
     }
+    std::replace(text.get(), text.get() + length, '-', '_');
     return {text.get(), length};
-}
-
-// The slot of a name in a table of 7001: the hash of ELF symbol tables over the name in upper case, with bytes taken as
-// signed.
-std::uint64_t hash_name(const csgl_string& name)
-{
-    std::uint32_t h = 0;
-    for (const char* p = name.c_str(); *p != '\0'; ++p) {
-        const auto byte = static_cast<signed char>(*p);
-        const int folded = byte > 0x60 ? byte - 0x20 : byte;
-        h = h * 16 + static_cast<std::uint32_t>(folded);
-        const std::uint32_t g = h & 0xf0000000u;
-        if (g != 0) {
-            h ^= g >> 24;
-        }
-        h &= ~g;
-    }
-    return h % hash_slots;
 }
 
 csgl_string cut_generated_name(const csgl_string& name)
 {
     const csgl_string front(name.c_str(), table_name_limit - hash_suffix_length);
     char suffix[hash_suffix_length + 1];
-    unpack_int(hash_name(front), suffix);
+    unpack_int(ldcf_hash_name(front), suffix);
     return front + suffix;
 }
 

@@ -1,9 +1,14 @@
-// The schema in the relational store: one table for each attribute, with names that the store accepts.
+// The schema in the relational store: one table for each attribute, with names that the store accepts, and the flat
+// records that tell the rest of the server how an attribute is stored and compared.
 #pragma once
 
 #include <cstdint>
 
 #include "servers/vrnd/libcsgl/csgl_string.h"
+#include "servers/vrnd/libdirbase/schema/asyntaxinfo.h"
+
+class ldcf_attrtype;
+class ldcf_objclass;
 
 class DIRBASE_EXPORT ldcf_rdbm {
 public:
@@ -21,6 +26,19 @@ public:
 
     // The name of the column, at most 17 characters; a longer one is cut to 16, with a message to the log.
     static csgl_string normalize_column_name(const csgl_string& name);
+
+    // A new record of a complete attribute type, or null, with the reason in the debug log: memory ran out, the syntax is
+    // none that values can be compared by, or a text column would be longer than the 32700 bytes that the store takes.
+    // Lengths of other columns are given up to 65535.
+    static asyntaxinfo* fill_asyntaxinfo(const ldcf_attrtype& attribute);
+
+    // A new record of an object class, or null when memory ran out.
+    static objectclassinfo* fill_classinfo(const ldcf_objclass& objclass);
+
+    // Free a record; null does nothing. The first also empties the name cache, which may lead to the record: readers must
+    // be kept out by the write side of the schema lock.
+    static void delete_asyntaxinfo(asyntaxinfo* info);
+    static void delete_objectclassinfo(objectclassinfo* info);
 };
 
 extern "C" {

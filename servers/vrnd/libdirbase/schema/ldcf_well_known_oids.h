@@ -46,6 +46,7 @@ constexpr const char* ldcf_syntax_telex = LDCF_SYNTAX_ARC "52";
 constexpr const char* ldcf_syntax_utc_time = LDCF_SYNTAX_ARC "53";
 constexpr const char* ldcf_syntax_syntax_description = LDCF_SYNTAX_ARC "54";
 constexpr const char* ldcf_syntax_substring_assertion = LDCF_SYNTAX_ARC "58";
+constexpr const char* ldcf_syntax_extended_attribute_description = "1.3.77.0.2.8.1";
 
 // A matching rule, which a definition may give by oid or by name.
 struct ldcf_known_rule {

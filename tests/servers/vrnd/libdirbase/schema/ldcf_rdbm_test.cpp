@@ -93,7 +93,7 @@ TEST(LdcfRdbm, ColumnNamesAreCutFoldedAndMadeAcceptable)
 
 TEST(LdcfRdbm, TableNamesAreCutFoldedAndQualified)
 {
-    Backend proxy{"proxy", nullptr, no_owner, nullptr};
+    Backend proxy{"proxy", nullptr, no_owner};
     Backend rdbm{"RDBM", &proxy, owner, entries};
     const back_ends list(&rdbm);
     EXPECT_EQ(table("a-bi", 5), "OWNER.A_BX");
@@ -123,7 +123,7 @@ TEST(LdcfRdbm, TableNamesAreCutFoldedAndQualified)
 
 TEST(LdcfRdbm, ATypesNamesComeFromItsDefinitionOrItsPrimaryName)
 {
-    Backend rdbm{"rdbm", nullptr, owner, nullptr};
+    Backend rdbm{"rdbm", nullptr, owner};
     const back_ends list(&rdbm);
     const message_catcher log;
     const char* const cases[][3] = {

@@ -1,0 +1,150 @@
+// The door to the schema for the rest of the server: plain functions that see names and flat records, not the classes.
+//
+// Look-ups, predicates and lists answer from the active schema. They take no lock: any number of threads may call them while
+// the caller holds the read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g), or while no change can be in
+// progress. The life cycle runs on one thread at start-up. No function raises an exception.
+#pragma once
+
+#include "servers/vrnd/libdirbase/base/backend.h"
+#include "servers/vrnd/libdirbase/locking/rdbm_lock.h"
+#include "servers/vrnd/libdirbase/schema/asyntaxinfo.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_hash.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
+
+struct Entry;
+
+// What ldcf_api_attrtype_apply calls for each attribute type; a result other than 0 ends the walk.
+using ldcf_attrtype_function = int (*)(asyntaxinfo* info, void* argument);
+
+extern "C" {
+
+// ---- life cycle, in this order ------------------------------------------------------------------------------------
+
+// Makes the schema lock and, at the first call, an empty name cache. Returns 0.
+DIRBASE_EXPORT int ldcf_api_schema_init(void);
+
+// Reads one schema file into the active schema. Returns 0, or 1 when anything is wrong with it; the message log tells.
+DIRBASE_EXPORT int ldcf_api_schema_parse(const char* file);
+
+// Links and checks the active schema. Returns 0 or 1.
+DIRBASE_EXPORT int ldcf_api_schema_complete(void);
+
+// Works out the names in the store, when the back ends are known, and fills the name cache. Returns 0 or 1.
+DIRBASE_EXPORT int ldcf_api_schema_complete_db_names(void);
+
+// ---- the schemas and their lock -----------------------------------------------------------------------------------
+
+DIRBASE_EXPORT ldcf_schema* ldcf_api_get_schema_g(void);
+DIRBASE_EXPORT ldcf_schema* ldcf_api_get_schema_proposed_g(void);
+
+// The lock "ldcf_modify_attr_info_lock": held for reading through every operation, for writing while the active schema is
+// replaced.
+DIRBASE_EXPORT extern rdbm_lock_t ldcf_api_modify_attr_info_lock_g;
+DIRBASE_EXPORT rdbm_lock_t* ldcf_api_get_modify_attr_info_lock_g(void);
+
+// How strictly entries are checked; 2 at start.
+DIRBASE_EXPORT extern std::int32_t ldcf_api_schema_check_g;
+DIRBASE_EXPORT void ldcf_api_set_schema_check(std::int32_t mode);
+DIRBASE_EXPORT std::int32_t ldcf_api_get_schema_check(void);
+
+// The active schema as the entry "cn=schema", kept by the schema back end; null when it must be built again.
+DIRBASE_EXPORT extern Entry* ldcf_api_schema_entry_g;
+
+// ---- look-ups -----------------------------------------------------------------------------------------------------
+
+// The record of an attribute type by name or OID, with or without "oid." in front, a language tag or ";binary" behind (the
+// latter for types of binary syntax only). Null for a name that the schema lacks, a null or empty name, and a type that
+// can't have a record.
+//
+//   base_out  may be null; on a name that the cache doesn't hold it receives the name without its language tags, a text for
+//             the caller to free(), or null when it has none. On a hit and with ";binary" it is left alone.
+//
+// A name that the cache holds costs no allocation (RFC 4512 section 2.5, RFC 3866).
+DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info(const char* name, char** base_out);
+
+// The OID of an attribute type by name, as above but without language tags; owned by the type. Null when there is none.
+DIRBASE_EXPORT const char* ldcf_api_attr_get_oid(const char* name);
+
+// The record of an attribute type of the proposed schema, by plain name or OID.
+DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info_from_proposed_schema(const char* name);
+
+// The record of the first type, in the order of names, whose values are in this table (without regard to case).
+DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info_based_on_table(const char* table);
+
+// The record of an object class by name or OID; null when the schema lacks it.
+DIRBASE_EXPORT objectclassinfo* ldcf_api_objectclass_get_info(const char* name);
+
+// Calls a function with the record of every attribute type, once each. Returns 0, or 80 when a type has no record or the
+// function gives anything but 0.
+DIRBASE_EXPORT int ldcf_api_attrtype_apply(ldcf_attrtype_function function, void* argument);
+
+// Free a record that belongs to no definition.
+DIRBASE_EXPORT void ldcf_api_delete_asyntaxinfo(asyntaxinfo* info);
+DIRBASE_EXPORT void ldcf_api_delete_objectclassinfo(objectclassinfo* info);
+
+// Drops the record of an attribute type, so that the next look-up makes it anew, and empties the name cache. Under the write
+// side of the schema lock. A name that the schema lacks does nothing.
+DIRBASE_EXPORT void ldcf_api_attrtype_reset_info(const char* name);
+
+// The table of a record, and what to do with the text afterwards: nothing, it stays with the record.
+DIRBASE_EXPORT char* get_qualified_table_name(asyntaxinfo* info);
+DIRBASE_EXPORT void free_qualified_table_name(char* name);
+
+// Puts every name of the active schema's attribute types into the name cache.
+DIRBASE_EXPORT void ldcf_api_load_attr_hash(void);
+
+// ---- predicates: false for a name that the schema lacks ---------------------------------------------------------------
+
+DIRBASE_EXPORT bool ldcf_api_is_langtag_attr(const char* name);     // may carry language tags
+DIRBASE_EXPORT bool ldcf_api_is_unique_attr(const char* name);      // may be made unique over the directory
+DIRBASE_EXPORT bool ldcf_api_is_attrcache_attr(const char* name);   // no user attribute
+DIRBASE_EXPORT bool ldcf_api_is_config_attr(const char* name);      // a configuration attribute
+DIRBASE_EXPORT bool ldcf_api_is_operational_attr(const char* name); // neither user nor configuration attribute
+DIRBASE_EXPORT bool ldcf_api_is_encryptable_attr(const char* name); // may be encrypted
+DIRBASE_EXPORT bool ldcf_api_is_encrypted_attr(const char* name);   // is encrypted
+DIRBASE_EXPORT bool ldcf_api_is_binary_syntax(const char* oid);     // takes the OID of a syntax
+
+// False for the few attribute types that can't carry language tags, by OID.
+DIRBASE_EXPORT bool checkIfLangTagAttrByOid(const char* oid);
+
+// ---- lists: primary names in the order of names, a new null-terminated array for charray_free -------------------------
+// Null when memory ran out. What a list without members gives is said with it.
+
+DIRBASE_EXPORT char** ldcf_api_get_langtag_attrs(void);         // null
+DIRBASE_EXPORT char** ldcf_api_get_nonlangtag_attrs(void);      // null
+DIRBASE_EXPORT char** ldcf_api_get_unique_attrs(void);          // null
+DIRBASE_EXPORT char** ldcf_api_get_nonunique_attrs(void);       // null
+DIRBASE_EXPORT char** ldcf_api_get_attrcache_attrs(void);       // null; user attributes
+DIRBASE_EXPORT char** ldcf_api_get_nonattrcache_attrs(void);    // null
+DIRBASE_EXPORT char** ldcf_api_get_config_attrs(void);          // null
+DIRBASE_EXPORT char** ldcf_api_get_nonconfig_attrs(void);       // null
+DIRBASE_EXPORT char** ldcf_api_get_operational_attrs(void);     // null
+DIRBASE_EXPORT char** ldcf_api_get_nonoperational_attrs(void);  // null
+DIRBASE_EXPORT char** ldcf_api_get_encryptable_attrs(void);     // an empty array
+DIRBASE_EXPORT char** ldcf_api_get_nonencryptable_attrs(void);  // an empty array
+DIRBASE_EXPORT char** ldcf_api_get_encrypted_attrs(void);       // an empty array; any kind of protection counts
+DIRBASE_EXPORT char** ldcf_api_get_nonencrypted_attrs(void);    // an empty array
+
+// 1 when any attribute type is encrypted, else 0.
+DIRBASE_EXPORT int ldcf_api_schema_contains_encrypted_attributes(void);
+
+// ---- for callers that know the classes -----------------------------------------------------------------------------
+
+// The attribute types that a complete class requires, or permits, inherited ones included.
+DIRBASE_EXPORT const csgl_set<ldcf_attrtype>& ldcf_api_get_must_set_from_objclass(const ldcf_objclass& objclass);
+DIRBASE_EXPORT const csgl_set<ldcf_attrtype>& ldcf_api_get_may_set_from_objclass(const ldcf_objclass& objclass);
+
+// The definition under a name that the schema holds; there is no answer for another name.
+DIRBASE_EXPORT const ldcf_attrtype& ldcf_api_get_attrtype_from_schema_g(const char* name);
+DIRBASE_EXPORT const ldcf_attrtype& ldcf_api_get_attrtype_from_proposed_schema_g(const char* name);
+DIRBASE_EXPORT const ldcf_objclass& ldcf_api_get_objclass_from_schema_g(const char* name);
+DIRBASE_EXPORT const ldcf_objclass& ldcf_api_get_objclass_from_proposed_schema_g(const char* name);
+
+// The record of the definition that a map holds under a name or an OID; null when the map lacks it or the record can't be
+// made. The second takes the first type, in the order of names, whose values are in this table.
+DIRBASE_EXPORT asyntaxinfo* ldcf_attrtype_get_info(const ldcf_map_name_to<ldcf_attrtype>& map, const char* name);
+DIRBASE_EXPORT asyntaxinfo* ldcf_attrtype_get_info_based_on_table(const ldcf_map_name_to<ldcf_attrtype>& map,
+                                                                  const char* table);
+DIRBASE_EXPORT objectclassinfo* ldcf_objectclass_get_info(const ldcf_map_name_to<ldcf_objclass>& map, const char* name);
+
+}  // extern "C"
