@@ -2,6 +2,7 @@
 #include <atomic>
 #include <thread>
 
+#include "servers/vrnd/libdirbase/schema/ldcf_api.h"
 #include "tests/servers/vrnd/libdirbase/schema/schema_fixture.h"
 
 using schema_test::described;
@@ -29,6 +30,8 @@ void side_by_side(const Action& action)
         thread.join();
     }
 }
+
+std::atomic<int> records_made{0};
 
 void load(ldcf_schema& schema)
 {
@@ -101,4 +104,34 @@ TEST(LdcfThreads, HandlesTakenByManyThreadsAreAllGivenBack)
     });
     EXPECT_EQ(wrong, 0u);
     EXPECT_EQ(counts(), before);
+}
+
+TEST(LdcfThreads, ARecordThatManyReadersAskForFirstIsMadeOnce)
+{
+    load(*ldcf_schema_g);
+    Backend counting{"rdbm", nullptr, nullptr, nullptr, [](asyntaxinfo*) { ++records_made; }};
+    g_backends = &counting;
+    std::size_t types = 0;
+    ldcf_for_each_definition(ldcf_schema_g->attribute_types, [&](const ldcf_attrtype&) { ++types; });
+    std::vector<std::vector<const void*>> seen(thread_count);
+    const auto look_all_up = [&](std::size_t i) {
+        seen[i].clear();
+        for (const auto& [key, type] : ldcf_schema_g->attribute_types) {
+            seen[i].push_back(ldcf_api_attr_get_info(key, nullptr));
+        }
+        for (const auto& [key, objclass] : ldcf_schema_g->object_classes) {
+            seen[i].push_back(ldcf_api_objectclass_get_info(key));
+        }
+        EXPECT_EQ(seen[i].size(), ldcf_schema_g->attribute_types.size() + ldcf_schema_g->object_classes.size());
+    };
+    side_by_side(look_all_up);
+    const std::vector<const void*> made = seen[0];
+    EXPECT_EQ(static_cast<std::size_t>(records_made), types);
+    ldcf_api_load_attr_hash();
+    side_by_side(look_all_up);  // through the cache now
+    for (const auto& records : seen) {
+        EXPECT_TRUE(records == made);
+    }
+    g_backends = nullptr;
+    ldcf_schema_g->clear();
 }
