@@ -94,6 +94,11 @@ void* calloc(std::size_t count, std::size_t size)
     return must_fail() ? out_of_memory() : made(__libc_calloc(count, size));
 }
 
+void* aligned_alloc(std::size_t alignment, std::size_t size)
+{
+    return must_fail() ? out_of_memory() : made(__libc_memalign(alignment, size));
+}
+
 void* realloc(void* block, std::size_t size)
 {
     if (block == nullptr) {

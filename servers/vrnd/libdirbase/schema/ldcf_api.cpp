@@ -9,7 +9,7 @@
 #include "libraries/libvrnutil/vrn_text.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
-#include "servers/vrnd/libdirbase/schema/ldcf_hash.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_hash_index.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_rdbm.h"
 
 rdbm_lock_t ldcf_api_modify_attr_info_lock_g;
@@ -48,7 +48,7 @@ const char* skip_oid_prefix(const char* name)
 // Whether a name ends in ";binary", with something in front of it.
 bool ends_in_binary(const char* name, std::size_t length)
 {
-    return length > binary_suffix_length &&
+    return length > binary_suffix_length && (name[length - 1] | 0x20) == 'y' &&
            vrn_strcasecmp(name + length - binary_suffix_length, binary_suffix) == 0;
 }
 
@@ -56,6 +56,15 @@ bool ends_in_binary(const char* name, std::size_t length)
 heap_text without_binary(const char* name, std::size_t length)
 {
     return heap_text(strndup(name, length - binary_suffix_length));
+}
+
+// The record of such a name's type, if its syntax is binary.
+[[gnu::noinline]] asyntaxinfo* binary_info(const char* name, std::size_t length)
+{
+    const heap_text plain = without_binary(name, length);
+    asyntaxinfo* info =
+        plain == nullptr ? nullptr : ldcf_attrtype_get_info(ldcf_schema_g->attribute_types, plain.get());
+    return info != nullptr && info->syntax == SC_BIN ? info : nullptr;
 }
 
 // The name in front of language tags: null in `base` when there are none. False when a tag is too long or memory ran out.
@@ -79,6 +88,22 @@ const T* find(const ldcf_map_name_to<T>& map, const char* name)
 {
     const auto found = name == nullptr ? map.end() : map.find(name);
     return found == map.end() ? nullptr : &found->second;
+}
+
+// What the cache doesn't hold. Kept apart from the common look-up, which is a few steps without it.
+[[gnu::noinline]] asyntaxinfo* uncached_info(const char* name, char** base_out)
+{
+    heap_text base;
+    if (!split_language_tags(name, base)) {
+        debug_error("ldcf_api_attr_get_info(): parse_language_tags() failed.\n");
+        return nullptr;
+    }
+    asyntaxinfo* info =
+        ldcf_attrtype_get_info(ldcf_schema_g->attribute_types, base == nullptr ? name : base.get());
+    if (base_out != nullptr) {
+        *base_out = base.release();
+    }
+    return info;
 }
 
 }  // namespace
@@ -203,29 +228,14 @@ asyntaxinfo* ldcf_api_attr_get_info(const char* name, char** base_out)
         return nullptr;
     }
     name = skip_oid_prefix(name);
-
-    // The cache may hold a name that itself ends in ";binary", which asks for the name in front of it all the same.
-    const ldcf_hash_tbl_entry* node = ldcf_hash_get(name);
-    if (node != nullptr && !ends_in_binary(node->name, static_cast<std::size_t>(node->length))) {
+    const std::size_t length = std::strlen(name);
+    if (ends_in_binary(name, length)) {
+        return binary_info(name, length);
+    }
+    if (const ldcf_hash_tbl_entry* node = ldcf_find_node(name, length); node != nullptr) {
         return node->info;
     }
-
-    const auto& map = ldcf_schema_g->attribute_types;
-    if (const std::size_t length = std::strlen(name); ends_in_binary(name, length)) {
-        const heap_text plain = without_binary(name, length);
-        asyntaxinfo* info = plain == nullptr ? nullptr : ldcf_attrtype_get_info(map, plain.get());
-        return info != nullptr && info->syntax == SC_BIN ? info : nullptr;
-    }
-    heap_text base;
-    if (!split_language_tags(name, base)) {
-        debug_error("ldcf_api_attr_get_info(): parse_language_tags() failed.\n");
-        return nullptr;
-    }
-    asyntaxinfo* info = ldcf_attrtype_get_info(map, base == nullptr ? name : base.get());
-    if (base_out != nullptr) {
-        *base_out = base.release();
-    }
-    return info;
+    return uncached_info(name, base_out);
 }
 
 const char* ldcf_api_attr_get_oid(const char* name)

@@ -1,124 +1,166 @@
-// The name cache: see ldcf_hash.h.
+// The name cache: see ldcf_hash.h, and ldcf_hash_index.h for the way of a look-up.
 #include "servers/vrnd/libdirbase/schema/ldcf_hash.h"
 
+#include <algorithm>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <iterator>
 #include <memory>
 #include <new>
 #include <utility>
+
+#include "servers/vrnd/libdirbase/schema/ldcf_hash_index.h"
+
+constinit ldcf_node_index ldcf_nodes_by_key;
 
 namespace {
 
 ldcf_hash_tbl_entry* slots[ldcf_hash_slots];
 
-// So that emptying an empty cache, which every dropped record does, costs nothing.
-std::size_t node_count = 0;
+constexpr unsigned first_index_bits = 10;
+
+// Memory for nodes with their keys, taken in large pieces and given back all at once. Each node begins a cache line, so
+// that with a key of usual length it fills one and no more.
+class node_memory {
+public:
+    // Null when memory ran out.
+    void* take(std::size_t size)
+    {
+        size = (size + line - 1) / line * line;
+        if (newest_ == nullptr || newest_->used + size > piece_size) {
+            void* block = std::aligned_alloc(line, piece_size);
+            if (block == nullptr) {
+                return nullptr;
+            }
+            newest_ = new (block) piece{newest_, line};
+        }
+        return reinterpret_cast<char*>(newest_) + std::exchange(newest_->used, newest_->used + size);
+    }
+
+    bool empty() const { return newest_ == nullptr; }
+
+    void give_back()
+    {
+        while (newest_ != nullptr) {
+            std::free(std::exchange(newest_, newest_->before));
+        }
+    }
+
+private:
+    static constexpr std::size_t line = 64;
+    static constexpr std::size_t piece_size = 64 * 1024;
+
+    struct piece {
+        piece* before;
+        std::size_t used;  // bytes, this record's line included
+    };
+    static_assert(sizeof(piece) <= line);
+    static_assert(line + sizeof(ldcf_hash_tbl_entry) + ldcf_hash_longest_key + line < piece_size);
+
+    piece* newest_ = nullptr;
+};
+
+constinit node_memory memory_of_nodes;
 
 struct close_file {
     void operator()(std::FILE* file) const { std::fclose(file); }
 };
 
-// Upper case for the letters, and "[" to "_" for the few bytes behind them.
-signed char fold(char c)
-{
-    const auto byte = static_cast<signed char>(c);
-    return static_cast<signed char>(byte > 0x60 ? byte - 0x20 : byte);
-}
-
-// The hash of ELF symbol tables, but for the top four bits, which the next character shifts out and slot_of masks away.
-std::uint32_t add_to_hash(std::uint32_t hash, signed char c)
-{
-    hash = hash * 16 + static_cast<std::uint32_t>(static_cast<std::int32_t>(c));
-    return hash ^ (hash >> 24 & 0xf0u);
-}
-
-std::uint32_t slot_of(std::uint32_t hash)
-{
-    return (hash & 0x0fffffffu) % ldcf_hash_slots;
-}
-
-// A name folded into a buffer of its own, with its slot.
-struct folded_key {
-    char text[ldcf_hash_longest_key + 1];
-    std::size_t length = 0;
-    std::uint32_t slot = 0;
-
-    // False for a name that the cache doesn't handle.
-    bool fold_name(const char* name)
-    {
-        if (name == nullptr) {
-            return false;
-        }
-        std::uint32_t hash = 0;
-        for (; name[length] != '\0'; ++length) {
-            if (length == ldcf_hash_longest_key) {
-                return false;
-            }
-            const signed char folded = fold(name[length]);
-            text[length] = static_cast<char>(folded);
-            hash = add_to_hash(hash, folded);
-        }
-        text[length] = '\0';
-        slot = slot_of(hash);
-        return true;
-    }
-};
-
 }  // namespace
+
+// ---- the index --------------------------------------------------------------------------------------------------------
+
+bool ldcf_node_index::put(ldcf_hash_tbl_entry* node)
+{
+    if (2 * (used_ + 1) > mask_ && !grow()) {
+        return false;
+    }
+    const ldcf_sought_name name(node->name, static_cast<std::size_t>(node->length));
+    place& found = place_of(name);
+    used_ += found.node == nullptr ? 1 : 0;
+    found = {name.hash(), node};
+    return true;
+}
+
+bool ldcf_node_index::grow()
+{
+    ldcf_node_index larger;
+    larger.mask_ = places_ == nullptr ? (std::size_t{1} << first_index_bits) - 1 : 2 * mask_ + 1;
+    larger.shift_ = places_ == nullptr ? 64 - first_index_bits : shift_ - 1;
+    larger.used_ = used_;
+    larger.places_ = static_cast<place*>(std::calloc(larger.mask_ + 1, sizeof(place)));
+    if (larger.places_ == nullptr) {
+        return false;
+    }
+    for (std::size_t i = 0; places_ != nullptr && i <= mask_; ++i) {
+        if (places_[i].node != nullptr) {
+            std::size_t at = larger.start_of(places_[i].hash);
+            while (larger.places_[at].node != nullptr) {
+                at = larger.next(at);
+            }
+            larger.places_[at] = places_[i];
+        }
+    }
+    std::free(places_);
+    *this = larger;
+    return true;
+}
+
+void ldcf_node_index::clear()
+{
+    std::free(places_);
+    *this = ldcf_node_index();
+}
+
+// ---- the cache --------------------------------------------------------------------------------------------------------
 
 std::uint32_t ldcf_hash_name(const char* text)
 {
     std::uint32_t hash = 0;
     for (; *text != '\0'; ++text) {
-        hash = add_to_hash(hash, fold(*text));
+        const auto c = static_cast<std::int32_t>(static_cast<signed char>(ldcf_fold_key(*text)));
+        hash = hash * 16 + static_cast<std::uint32_t>(c);
+        const std::uint32_t high = hash & 0xf0000000u;
+        hash = (hash ^ high >> 24) & ~high;
     }
-    return slot_of(hash);
+    return hash % ldcf_hash_slots;
 }
 
 const ldcf_hash_tbl_entry* ldcf_hash_get(const char* name)
 {
-    folded_key key;
-    if (!key.fold_name(name)) {
-        return nullptr;
-    }
-    const auto length = static_cast<std::int32_t>(key.length);
-    for (const ldcf_hash_tbl_entry* node = slots[key.slot]; node != nullptr; node = node->next) {
-        if (node->length == length && std::memcmp(node->name, key.text, key.length) == 0) {
-            return node;
-        }
-    }
-    return nullptr;
+    return name == nullptr ? nullptr : ldcf_find_node(name, std::strlen(name));
 }
 
 void ldcf_hash_put(const char* name, asyntaxinfo* info)
 {
-    folded_key key;
-    if (!key.fold_name(name)) {
+    const std::size_t length = name == nullptr ? 0 : std::strlen(name);
+    if (name == nullptr || length > ldcf_hash_longest_key) {
         return;
     }
-    void* block = std::malloc(sizeof(ldcf_hash_tbl_entry) + key.length + 1);
+    void* block = memory_of_nodes.take(sizeof(ldcf_hash_tbl_entry) + length + 1);
     if (block == nullptr) {
         return;
     }
-    char* text = static_cast<char*>(block) + sizeof(ldcf_hash_tbl_entry);
-    std::memcpy(text, key.text, key.length + 1);
-    slots[key.slot] = new (block)
-        ldcf_hash_tbl_entry{text, info, static_cast<std::int32_t>(key.length), slots[key.slot]};
-    ++node_count;
+    char* key = static_cast<char*>(block) + sizeof(ldcf_hash_tbl_entry);
+    for (std::size_t i = 0; i <= length; ++i) {
+        key[i] = ldcf_fold_key(name[i]);
+    }
+    ldcf_hash_tbl_entry*& head = slots[ldcf_hash_name(key)];
+    auto* node = new (block) ldcf_hash_tbl_entry{key, info, static_cast<std::int32_t>(length), head};
+    if (ldcf_nodes_by_key.put(node)) {  // else the node lies idle until the next flush
+        head = node;
+    }
 }
 
 void ldcf_hash_flush(void)
 {
-    if (node_count == 0) {
-        return;
+    if (memory_of_nodes.empty()) {
+        return;  // most often: every record that is dropped empties the cache
     }
-    for (ldcf_hash_tbl_entry*& head : slots) {
-        while (head != nullptr) {
-            std::free(std::exchange(head, head->next));
-        }
-    }
-    node_count = 0;
+    std::fill(std::begin(slots), std::end(slots), nullptr);
+    ldcf_nodes_by_key.clear();
+    memory_of_nodes.give_back();
 }
 
 void ldcf_debug_hash_tbl(const char* filename)
