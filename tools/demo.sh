@@ -76,8 +76,14 @@ run schema modify --schema schema add guest.oc
 heading 'What changed on disk: one file, the one that takes additions'
 diff -r -u --label before --label after before schema | grep -v '^diff' || true
 
-heading 'The attribute type, with what it inherits'
+heading 'The attribute type, with what it inherits, and how the server holds its values'
 run schema show demoBadge --schema schema
+
+heading 'How the two directories differ'
+run_refused schema diff before schema
+
+heading 'Attribute types by a property: those of the configuration'
+run schema list config --schema schema
 
 heading 'While the class uses it, the attribute type stays'
 run_refused schema modify --schema schema delete badge.at

@@ -7,23 +7,6 @@
 
 namespace dirbase_tool {
 
-const char* kind_of(const ldcf_syntax&)
-{
-    return LDCF_KIND_SYNTAX;
-}
-const char* kind_of(const ldcf_matchrule&)
-{
-    return LDCF_KIND_MATCHING_RULE;
-}
-const char* kind_of(const ldcf_attrtype&)
-{
-    return LDCF_KIND_ATTRIBUTE_TYPE;
-}
-const char* kind_of(const ldcf_objclass&)
-{
-    return LDCF_KIND_OBJECT_CLASS;
-}
-
 namespace {
 
 template <typename Map, typename Uses>
@@ -31,7 +14,7 @@ void collect_users(std::vector<std::string>& users, const Map& map, Uses&& uses)
 {
     ldcf_for_each_definition(map, [&](const auto& definition) {
         if (uses(definition)) {
-            users.push_back(std::string(kind_of(definition)) + " '" + text_of(definition.name()) + "'");
+            users.push_back(std::string(ldcf_kind_of(definition)) + " '" + text_of(definition.name()) + "'");
         }
     });
 }

@@ -8,12 +8,6 @@
 
 namespace dirbase_tool {
 
-// The kind words of the library's messages.
-const char* kind_of(const ldcf_syntax& definition);
-const char* kind_of(const ldcf_matchrule& definition);
-const char* kind_of(const ldcf_attrtype& definition);
-const char* kind_of(const ldcf_objclass& definition);
-
 // "still used by attribute type 'a', object class 'b' and 3 more", about the definition of a complete schema that has
 // the oid of the given one; empty when there is none, or nothing uses it.
 std::string note_of_users(const ldcf_syntax& definition, const ldcf_schema& schema);

@@ -1,4 +1,9 @@
 // The sheet of an attribute type: what it says, what it inherits and from where, and what the store makes of it.
+#include <cinttypes>
+#include <cstdio>
+
+#include "servers/vrnd/libdirbase/base/syntax_codes.h"
+#include "servers/vrnd/libdirbase/schema/asyntaxinfo.h"
 #include "tools/dirbase/describe_definition.h"
 
 namespace dirbase_tool {
@@ -121,8 +126,74 @@ std::string length_source(const ldcf_attrtype& attribute)
     return type == attribute ? source : source + " of " + text_of(type.name());
 }
 
+// How the server holds or compares values, such as "text without regard to case (0x001)".
+struct code_words {
+    std::uint32_t code;
+    const char* words;
+};
+
+constexpr code_words syntax_code_words[] = {
+    {SC_CIS, "text without regard to case"},
+    {SC_CES, "text"},
+    {SC_BIN, "bytes"},
+    {SC_TEL | SC_CIS, "telephone number"},
+    {SC_DN | SC_CIS, "distinguished name"},
+    {SC_INT, "integer"},
+    {SC_BOOL, "boolean"},
+    {SC_GT, "generalized time"},
+    {SC_UTCT, "UTC time"},
+    {SC_BIT_STRING | SC_CIS, "bit string"},
+    {SC_NUMERIC_STRING | SC_CIS, "numeric string"},
+    {SC_COUNTRY_STRING | SC_CIS, "country"},
+};
+
+void add_code(definition_sheet& sheet, const std::string& label, const std::string& key, std::uint32_t code)
+{
+    std::string words;
+    for (const code_words& known : syntax_code_words) {
+        words = known.code == code ? known.words : words;
+    }
+    char number[16];
+    std::snprintf(number, sizeof number, "0x%03" PRIx32, code);
+    sheet.add(label, words.empty() ? "none" : words + " (" + number + ")", key,
+              words.empty() ? json() : json{{"value", words}, {"code", code}});
+}
+
+void add_column(definition_sheet& sheet, const std::string& label, const std::string& key, const rdbm_col_info* column)
+{
+    if (column == nullptr) {
+        sheet.add(label, key, std::string());
+        return;
+    }
+    const std::string length = column->length == 0 ? "no limit" : std::to_string(column->length) + " bytes";
+    sheet.add(label, std::string(column->name) + ", " + length, key,
+              {{"name", column->name}, {"length", column->length}});
+}
+
+// The flat record, which is what the server works by.
+void add_record(definition_sheet& sheet, const ldcf_attrtype& attribute)
+{
+    const asyntaxinfo* info = attribute.info();
+    if (info == nullptr) {
+        sheet.add("values held as", "nothing: the server can't compare values of this syntax, or store such long ones",
+                  "heldAs", json());
+        sheet.add("table", "table", text_of(attribute->table()));
+        sheet.add("column", text_of(attribute->column()), "column", {{"name", text_of(attribute->column())}});
+        return;
+    }
+    add_code(sheet, "values held as", "heldAs", info->syntax);
+    add_code(sheet, "equality compares", "equalityCompares", info->equality);
+    add_code(sheet, "substrings compares", "substringsCompares", info->substring);
+    add_code(sheet, "ordering compares", "orderingCompares", info->ordering);
+    sheet.add("table", "table", text_of(attribute->table()));
+    sheet.add("short table", "shortTable", std::string(info->short_table == nullptr ? "" : info->short_table));
+    add_column(sheet, "column", "column", info->attr);
+    add_column(sheet, "truncated column", "truncatedColumn", info->trunc);
+}
+
 void add_store(definition_sheet& sheet, const ldcf_attrtype& attribute)
 {
+    add_record(sheet, attribute);
     std::vector<std::string> indexes;
     for (unsigned i = 0; i < ldcf_index_count; ++i) {
         const auto index = static_cast<ldcf_index>(i);
@@ -131,8 +202,6 @@ void add_store(definition_sheet& sheet, const ldcf_attrtype& attribute)
             indexes.push_back(index_words[i] + (length > 0 ? " " + std::to_string(length) : std::string()));
         }
     }
-    sheet.add("table", "table", text_of(attribute->table()));
-    sheet.add("column", "column", text_of(attribute->column()));
     sheet.add("indexes", "indexes", indexes);
     sheet.add("access class", "accessClass", std::string(access_class_word(attribute->access_class())));
     sheet.add("encryption", "encryption", std::string(encryption_word(attribute->encryption())));

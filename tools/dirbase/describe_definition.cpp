@@ -5,8 +5,6 @@
 
 namespace dirbase_tool {
 
-namespace {
-
 const char* kind_word(ldcf_objclass_kind kind)
 {
     switch (kind) {
@@ -17,6 +15,8 @@ const char* kind_word(ldcf_objclass_kind kind)
     }
     return "STRUCTURAL";
 }
+
+namespace {
 
 // A class and its superclasses, nearest first. The library's own sets have no order that means anything.
 std::vector<ldcf_objclass> lineage_of(const ldcf_objclass& objclass, const ldcf_schema& schema)

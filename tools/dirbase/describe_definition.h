@@ -12,6 +12,9 @@ definition_sheet describe(const ldcf_matchrule& rule, const ldcf_schema& schema,
 definition_sheet describe(const ldcf_attrtype& attribute, const ldcf_schema& schema, const schema_directory& directory);
 definition_sheet describe(const ldcf_objclass& objclass, const ldcf_schema& schema, const schema_directory& directory);
 
+// ABSTRACT, STRUCTURAL or AUXILIARY.
+const char* kind_word(ldcf_objclass_kind kind);
+
 // The primary name, then the other names in their order.
 template <typename T>
 std::vector<std::string> names_of(const T& definition)

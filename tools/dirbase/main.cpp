@@ -34,6 +34,12 @@ Forms:
   inherited    what the definition in the same line of --form v3 leaves out; this can't be loaded
 )";
 
+constexpr char diff_details[] =
+    R"(A definition that stands in one directory only is told as new or gone; one that differs with both texts, and
+of an object class also what that changes: its kind, its superiors, and the attribute types that it lists
+itself. The order and the spelling of files don't count. Exit status 1 says that there are differences.
+)";
+
 constexpr char modify_details[] =
     R"(The change is made whole or not at all. An added definition goes to the file that is listed last, a replaced
 one stays in its file. A file that changes is written anew from its definitions, without its comments. What
@@ -50,6 +56,9 @@ struct options {
     std::string form;
     std::string kind;
     std::vector<std::string> names;
+    std::string property;
+    std::string before;
+    std::string after;
     std::string operation;
     std::string definition_file;
 };
@@ -111,20 +120,28 @@ void expect_subcommand(CLI::App& app)
     app.require_subcommand(0, 1);
 }
 
-CLI::App* add_command(CLI::App& group, const std::string& name, const std::string& description,
-                      const std::string& details, common_options& common)
+CLI::App* add_bare_command(CLI::App& group, const std::string& name, const std::string& description,
+                           const std::string& details, common_options& common)
 {
     CLI::App* app = group.add_subcommand(name, description);
     add_flags_of_all(*app);
     app->footer(details + exit_statuses);
-    app->add_option("--schema", common.schema_folder,
-                    "Directory of schema.list and the files that it names (default: that of\n"
-                    "the environment variable DIRBASE_SCHEMA, else the one that came along)")
-        ->type_name("DIR");
     app->add_flag("--json", common.as_json,
                   "Write the result as JSON; a failure is an object too, with \"ok\": false and \"error\"");
     app->add_flag("-v,--verbose", common.verbosity,
                   "Show the message log on standard error; given twice, the debug log too");
+    return app;
+}
+
+// A command that works on one schema directory.
+CLI::App* add_command(CLI::App& group, const std::string& name, const std::string& description,
+                      const std::string& details, common_options& common)
+{
+    CLI::App* app = add_bare_command(group, name, description, details, common);
+    app->add_option("--schema", common.schema_folder,
+                    "Directory of schema.list and the files that it names (default: that of\n"
+                    "the environment variable DIRBASE_SCHEMA, else the one that came along)")
+        ->type_name("DIR");
     return app;
 }
 
@@ -164,6 +181,32 @@ void add_show(CLI::App& group, options& given, command& chosen)
         ->type_name("")
         ->required();
     app->callback([&] { chosen = [&](message_collector&) { return show_definitions(given.common, given.names); }; });
+}
+
+void add_list(CLI::App& group, options& given, command& chosen)
+{
+    std::string words = "Properties:";
+    for (const std::string& word : list_words()) {
+        words += (words.size() - words.rfind('\n') + word.size() > 100 ? "\n  " : " ") + word;
+    }
+    CLI::App* app = add_command(group, "list", "List the attribute types that have a property, a name a line",
+                                words + "\n", given.common);
+    app->add_option("PROPERTY", given.property, "The property, such as encryptable or nonencryptable")
+        ->check(CLI::IsMember(list_words()).description(""))
+        ->type_name("")
+        ->required();
+    app->callback([&] { chosen = [&](message_collector&) { return list_attributes(given.common, given.property); }; });
+}
+
+void add_diff(CLI::App& group, options& given, command& chosen)
+{
+    CLI::App* app = add_bare_command(group, "diff", "Tell how one schema directory differs from another", diff_details,
+                                     given.common);
+    app->add_option("BEFORE", given.before, "The directory to compare with")->type_name("")->required();
+    app->add_option("AFTER", given.after, "The directory that may differ")->type_name("")->required();
+    app->callback([&] {
+        chosen = [&](message_collector&) { return diff_schemas(given.common, given.before, given.after); };
+    });
 }
 
 void add_modify(CLI::App& group, options& given, command& chosen)
@@ -243,12 +286,14 @@ int main_of_tool(int argc, char** argv)
     CLI::App app("Tools for the data of an LDAP directory server.", "dirbase");
     add_flags_of_all(app);
     expect_subcommand(app);
-    CLI::App* schema = app.add_subcommand("schema", "Check, print, explain and change schema files");
+    CLI::App* schema = app.add_subcommand("schema", "Check, print, explain, compare and change schema files");
     add_flags_of_all(*schema);
     expect_subcommand(*schema);
     add_check(*schema, given, chosen);
     add_print(*schema, given, chosen);
     add_show(*schema, given, chosen);
+    add_list(*schema, given, chosen);
+    add_diff(*schema, given, chosen);
     add_modify(*schema, given, chosen);
 
     try {

@@ -35,6 +35,15 @@ int print_schema(const common_options& common, print_form form, print_kind kind)
 // Explains every definition that one of the names or oids leads to.
 int show_definitions(const common_options& common, const std::vector<std::string>& names);
 
+// The words of the properties that list_attributes knows.
+std::vector<std::string> list_words();
+
+// Prints the attribute types that have a property, by primary name, a line each.
+int list_attributes(const common_options& common, const std::string& word);
+
+// Tells how the schema in one directory differs from that in another. Differences are findings.
+int diff_schemas(const common_options& common, const std::string& before, const std::string& after);
+
 // Adds, deletes or replaces (`operation`) the one definition that a file holds.
 int modify_schema(const common_options& common, const std::string& operation, const std::string& file,
                   message_collector& log);

@@ -227,7 +227,7 @@ int modify(const common_options& common, const schema_directory& directory, ldcf
         tell("warning: " + warning);
     }
 
-    const std::string kind = kind_of(definition);
+    const std::string kind = ldcf_kind_of(definition);
     const std::string name = text_of(definition.name());
     const std::string oid = text_of(definition.oid());
     if (common.as_json) {

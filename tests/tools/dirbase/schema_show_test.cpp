@@ -20,7 +20,9 @@ constexpr char family[] =
     "    SYNTAX 1.3.6.1.4.1.1466.115.121.1.15{40} )\n"
     "  ( 1.2.3.2 NAME 'middle' SUP stem ORDERING caseExactOrderingMatch )\n"
     "  ( 1.2.3.3 NAME 'leaf' DESC 'At the end' SUP 1.2.3.2 SINGLE-VALUE )\n"
-    "  ( 1.2.3.4 NAME 'phone' SYNTAX 1.3.6.1.4.1.1466.115.121.1.50 ) ( 1.2.3.5 NAME 'call' SUP phone ) }\n"
+    "  ( 1.2.3.4 NAME 'phone' SYNTAX 1.3.6.1.4.1.1466.115.121.1.50 ) ( 1.2.3.5 NAME 'call' SUP phone )\n"
+    "  ( 1.2.3.6 NAME 'huge' SYNTAX 1.3.6.1.4.1.1466.115.121.1.15{32701} )\n"
+    "  ( 1.2.3.7 NAME 'a-long-name-of-a' SYNTAX 1.3.6.1.4.1.1466.115.121.1.15{241} ) }\n"
     "XANattributeTypes { ( 1.2.3.2 DBNAME ( 'mid_table' 'mid_column' ) LENGTH 77 EQUALITY ORDERING 9\n"
     "    ENCRYPT AES-256 ) }\n"
     "objectClasses { ( 1.2.3.10 NAME 'base' ABSTRACT SUP top MUST root MAY ( leaf $ phone ) )\n"
@@ -55,14 +57,21 @@ TEST(SchemaShow, EachFactNamesItsSource)
           " ordering rule caseExactOrderingMatch (2.5.13.6), inherited from middle", " substrings rule none",
           " syntax 1.3.6.1.4.1.1466.115.121.1.15 (Directory String), inherited from root",
           " effective length 77, from LENGTH of the extended definition of middle", " single value yes", " table LEAF",
-          " column LEAF", " extended definition none", " file V3.additions"}},
+          " column LEAF, 77 bytes", " values held as text (0x002)",
+          " equality compares text (0x002)", " truncated column none", " extended definition none", " file V3.additions"}},
         {"MIDDLE",
          {"attribute type middle", " subtypes leaf", " ordering rule caseExactOrderingMatch (2.5.13.6)",
-          " effective length 77, from LENGTH of the extended definition", " table MID_TABLE", " column MID_COLUMN",
+          " effective length 77, from LENGTH of the extended definition", " table MID_TABLE", " column MID_COLUMN, 77 bytes",
           " indexes EQUALITY, ORDERING 9", " encryption AES-256", " access class NORMAL",
           " extended in file V3.additions"}},
         {"stem", {"attribute type root", " names root, stem", " effective length 40, from SYNTAX", " supertypes none"}},
-        {"phone", {" effective length 32, by default for the syntax"}},
+        {"phone",
+         {" effective length 32, by default for the syntax", " values held as telephone number (0x009)",
+          " equality compares none", " short table none"}},
+        {"1.2.3.6",
+         {" values held as nothing: the server can't compare values of this syntax, or store such long ones",
+          " table HUGE", " column HUGE"}},
+        {"1.2.3.7", {" truncated column A_LONG_NAME_OF__T, 240 bytes"}},
         {"call", {" effective length 32, by default for the syntax of phone"}},
         {"derived",
          {"object class derived", " class kind STRUCTURAL", " superclasses base, top", " subclasses leaf",

@@ -49,6 +49,23 @@ ldcf_translation<T> ldcf_schema_copy(ldcf_map_name_to<T>& to, const ldcf_map_nam
 
 }  // namespace
 
+const char* ldcf_kind_of(const ldcf_syntax&)
+{
+    return LDCF_KIND_SYNTAX;
+}
+const char* ldcf_kind_of(const ldcf_matchrule&)
+{
+    return LDCF_KIND_MATCHING_RULE;
+}
+const char* ldcf_kind_of(const ldcf_attrtype&)
+{
+    return LDCF_KIND_ATTRIBUTE_TYPE;
+}
+const char* ldcf_kind_of(const ldcf_objclass&)
+{
+    return LDCF_KIND_OBJECT_CLASS;
+}
+
 ldcf_schema::~ldcf_schema()
 {
     incomplete();

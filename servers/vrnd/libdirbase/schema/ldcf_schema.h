@@ -17,6 +17,12 @@
 #include "servers/vrnd/libdirbase/schema/ldcf_objclass.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_syntax.h"
 
+// What a definition is called in messages: "syntax", "matching rule", "attribute type" or "object class".
+DIRBASE_EXPORT const char* ldcf_kind_of(const ldcf_syntax& definition);
+DIRBASE_EXPORT const char* ldcf_kind_of(const ldcf_matchrule& definition);
+DIRBASE_EXPORT const char* ldcf_kind_of(const ldcf_attrtype& definition);
+DIRBASE_EXPORT const char* ldcf_kind_of(const ldcf_objclass& definition);
+
 class DIRBASE_EXPORT ldcf_schema {
 public:
     // Whether a schema file has changes that are not yet on disk. A file name that is met for the first time starts as

@@ -1,27 +1,8 @@
 // Single definitions: into a schema, out of it, and one in the place of another.
+#include "libraries/libber/ldap_result.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
 
 namespace {
-
-constexpr int result_no_such_attribute = 16;
-constexpr int result_type_or_value_exists = 20;
-
-const char* kind_of(const ldcf_syntax&)
-{
-    return LDCF_KIND_SYNTAX;
-}
-const char* kind_of(const ldcf_matchrule&)
-{
-    return LDCF_KIND_MATCHING_RULE;
-}
-const char* kind_of(const ldcf_attrtype&)
-{
-    return LDCF_KIND_ATTRIBUTE_TYPE;
-}
-const char* kind_of(const ldcf_objclass&)
-{
-    return LDCF_KIND_OBJECT_CLASS;
-}
 
 // "[p[kind]p] [p['key']p] <fault>"
 csgl_string about(const char* kind, const csgl_string& key, const char* fault)
@@ -31,13 +12,13 @@ csgl_string about(const char* kind, const csgl_string& key, const char* fault)
 
 [[noreturn]] void throw_already_exists(const char* kind, const csgl_string& key)
 {
-    throw exc_ldap_rc_t(__FILE__, __LINE__, about(kind, key, " already exists").c_str(), result_type_or_value_exists,
+    throw exc_ldap_rc_t(__FILE__, __LINE__, about(kind, key, " already exists").c_str(), LDAP_TYPE_OR_VALUE_EXISTS,
                         LDCF_MSG_ALREADY_EXISTS);
 }
 
 [[noreturn]] void throw_does_not_exist(const char* kind, const csgl_string& key, int message_id)
 {
-    throw exc_ldap_rc_t(__FILE__, __LINE__, about(kind, key, " does not exist").c_str(), result_no_such_attribute,
+    throw exc_ldap_rc_t(__FILE__, __LINE__, about(kind, key, " does not exist").c_str(), LDAP_NO_SUCH_ATTRIBUTE,
                         message_id);
 }
 
@@ -52,11 +33,11 @@ template <typename T>
 void refuse_existing(const ldcf_map_name_to<T>& map, const T& definition)
 {
     if (map.count(definition.oid()) != 0) {
-        throw_already_exists(kind_of(definition), definition.oid());
+        throw_already_exists(ldcf_kind_of(definition), definition.oid());
     }
     for (const csgl_string& name : definition->names()) {
         if (map.count(name) != 0) {
-            throw_already_exists(kind_of(definition), name);
+            throw_already_exists(ldcf_kind_of(definition), name);
         }
     }
 }
@@ -121,15 +102,15 @@ T find_for_erase(const ldcf_map_name_to<T>& map, const T& given)
 {
     const T found = ldcf_find(map, given.oid());
     if (!found) {
-        throw_does_not_exist(kind_of(given), given.oid(), LDCF_MSG_DELETE_NOT_THERE);
+        throw_does_not_exist(ldcf_kind_of(given), given.oid(), LDCF_MSG_DELETE_NOT_THERE);
     }
     for (const csgl_string& name : given->names()) {
         const T named = ldcf_find(map, name);
         if (!named) {
-            throw_does_not_exist(kind_of(given), name, LDCF_MSG_DELETE_NOT_THERE);
+            throw_does_not_exist(ldcf_kind_of(given), name, LDCF_MSG_DELETE_NOT_THERE);
         }
         if (!(named == found)) {
-            throw_two_bodies(kind_of(given), given.oid(), name, LDCF_MSG_DELETE_TWO_BODIES);
+            throw_two_bodies(ldcf_kind_of(given), given.oid(), name, LDCF_MSG_DELETE_TWO_BODIES);
         }
     }
     return found;
@@ -146,7 +127,7 @@ T erase_from(ldcf_map_name_to<T>& map, const T& given)
     const int count = found->value();
     if (count != expected) {
         const csgl_string text =
-            ldcf_join(about(kind_of(found), found.oid(), " can not be deleted; its refcount is [p["),
+            ldcf_join(about(ldcf_kind_of(found), found.oid(), " can not be deleted; its refcount is [p["),
                       ldcf_number(count), "]p].  It should be [p[", ldcf_number(expected), "]p]");
         throw exc_invalid_state_t(__FILE__, __LINE__, text.c_str(), LDCF_MSG_IN_USE);
     }
@@ -257,20 +238,20 @@ void ldcf_schema::replace_in(const char* kind, T& definition, Map& map)
 
 void ldcf_schema::replace(ldcf_syntax& definition)
 {
-    replace_in(kind_of(definition), definition, syntaxes);
+    replace_in(ldcf_kind_of(definition), definition, syntaxes);
 }
 
 void ldcf_schema::replace(ldcf_matchrule& definition)
 {
-    replace_in(kind_of(definition), definition, matching_rules);
+    replace_in(ldcf_kind_of(definition), definition, matching_rules);
 }
 
 void ldcf_schema::replace(ldcf_attrtype& definition)
 {
-    replace_in(kind_of(definition), definition, attribute_types);
+    replace_in(ldcf_kind_of(definition), definition, attribute_types);
 }
 
 void ldcf_schema::replace(ldcf_objclass& definition)
 {
-    replace_in(kind_of(definition), definition, object_classes);
+    replace_in(ldcf_kind_of(definition), definition, object_classes);
 }
