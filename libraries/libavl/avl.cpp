@@ -8,6 +8,7 @@
 #include <cstddef>
 #include <cstdio>
 #include <cstdlib>
+#include <iterator>
 
 #include "libraries/libmsg/message_log.h"
 
@@ -19,8 +20,14 @@ constexpr side_t left = -1;
 constexpr side_t even = 0;
 constexpr side_t right = 1;
 
-// No tree that fits into memory is higher: a tree of height h has more than 1.6^h nodes.
+// No balanced tree that fits into memory is higher: one of height h has more than 1.6^h nodes.
 constexpr std::size_t max_height = 96;
+constexpr const char* too_high = "avl height error";
+
+void report_damage(const char* what)
+{
+    PrintMessage(MSG_COMPONENT_SERVER, MSG_INFORMATION, 106, what);
+}
 
 constexpr side_t other(side_t side)
 {
@@ -49,7 +56,7 @@ bool rotate(avl_node** link, side_t up)
     avl_node* node = *link;
     avl_node* risen = node != nullptr ? child(node, up) : nullptr;
     if (risen == nullptr) {
-        PrintMessage(MSG_COMPONENT_SERVER, MSG_INFORMATION, 106, up == left ? "avl RR error" : "avl RL error");
+        report_damage(up == left ? "avl RR error" : "avl RL error");
         return false;
     }
     child(node, up) = child(risen, other(up));
@@ -230,6 +237,10 @@ int avl_insert(avl_node** root, void* data, avl_cmp cmp, avl_dup dup)
         const bool leans = node->balance != even;
         top = leans ? link : top;
         turn = leans ? way : turn;
+        if (turn == std::end(way)) {
+            report_damage(too_high);
+            return AVL_FAILURE;
+        }
         *turn++ = order < 0 ? left : right;
         link = order < 0 ? &node->left : &node->right;
     }
@@ -264,6 +275,14 @@ void* avl_delete(avl_node** root, const void* data, avl_cmp cmp)
     };
     turn_t way[max_height];
     turn_t* turn = way;
+    const auto remember = [&](avl_node** link, side_t side) {
+        if (turn == std::end(way)) {
+            report_damage(too_high);
+            return false;
+        }
+        *turn++ = {link, side};
+        return true;
+    };
 
     avl_node** link = root;
     avl_node* found = *link;
@@ -272,7 +291,8 @@ void* avl_delete(avl_node** root, const void* data, avl_cmp cmp)
         const int order = cmp(data, found->data, 0);
         if (order == 0)
             break;
-        *turn++ = {link, order < 0 ? left : right};
+        if (!remember(link, order < 0 ? left : right))
+            return nullptr;
         link = order < 0 ? &found->left : &found->right;
     }
     if (found == nullptr)
@@ -281,9 +301,12 @@ void* avl_delete(avl_node** root, const void* data, avl_cmp cmp)
     // With two children, the node of the next greater object goes, and this one takes over that object.
     void* removed = found->data;
     if (found->left != nullptr && found->right != nullptr) {
-        *turn++ = {link, right};
-        for (link = &found->right; (*link)->left != nullptr; link = &(*link)->left)
-            *turn++ = {link, left};
+        if (!remember(link, right))
+            return nullptr;
+        for (link = &found->right; (*link)->left != nullptr; link = &(*link)->left) {
+            if (!remember(link, left))
+                return nullptr;
+        }
         found->data = (*link)->data;
     }
     avl_node* gone = *link;

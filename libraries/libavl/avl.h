@@ -55,8 +55,8 @@ DIRBASE_EXPORT extern const char avl_version[];
 //   root  address of the tree; the root changes with the shape.
 //   dup   asked when an equal object is there; the tree then stays as it is.
 //
-// Returns 0; or what `dup` gave; or -1 when no node could be allocated, or when the tree is damaged at the place, which
-// message 106 reports. Only after 0 from a call without an equal object does the tree hold `data`.
+// Returns 0; or what `dup` gave, which may be 0 too, and then the tree doesn't hold `data`; or -1 when no node could be
+// allocated, or when the tree is damaged on the way, which message 106 reports.
 DIRBASE_EXPORT int avl_insert(avl_node** root, void* data, avl_cmp cmp, avl_dup dup);
 
 // Duplicate rules for avl_insert: the insert fails with -1, or it succeeds with 0 and keeps the stored object.

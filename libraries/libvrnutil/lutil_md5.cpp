@@ -14,7 +14,7 @@ static_assert(MD5_DIGEST_LENGTH == 16);
 
 namespace {
 
-MD5_CTX* of(lutil_MD5Context* context)
+MD5_CTX* context_of(lutil_MD5Context* context)
 {
     return std::launder(reinterpret_cast<MD5_CTX*>(context->room));
 }
@@ -31,12 +31,12 @@ void lutil_MD5Init(lutil_MD5Context* context)
 void lutil_MD5Update(lutil_MD5Context* context, const unsigned char* data, std::size_t length)
 {
     if (length != 0)
-        MD5Update(of(context), data, length);
+        MD5Update(context_of(context), data, length);
 }
 
 void lutil_MD5Final(unsigned char digest[16], lutil_MD5Context* context)
 {
-    MD5Final(digest, of(context));
+    MD5Final(digest, context_of(context));
 }
 
 }  // extern "C"

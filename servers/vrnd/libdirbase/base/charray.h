@@ -18,7 +18,7 @@ DIRBASE_EXPORT int charray_add(char*** array, char* text);
 // shorter text comes first, texts of equal length are in the order of strcmp, equal ones in the order of arrival.
 DIRBASE_EXPORT int charray_add_sorted_by_len(char*** array, char* text);
 
-// Appends the texts of `other` (not null) themselves. After a success the caller releases the array `other`, and only the
+// Appends the texts of `other` (not null, another array) themselves. After a success the caller releases the array `other`, and only the
 // array, with free().
 DIRBASE_EXPORT int charray_merge(char*** array, char** other);
 
@@ -34,13 +34,13 @@ DIRBASE_EXPORT int charray_inlist(char** array, const char* text);
 DIRBASE_EXPORT int charray_inlist_with_index(char** array, const char* text, int* index);
 
 // Returns a copy of array and texts for the caller to release with charray_free; null when there is no element, and when
-// memory ran out.
+// memory ran out, which is not told.
 DIRBASE_EXPORT char** charray_dup(char** array);
 
 // Splits `text`, which is overwritten, at each run of the characters of `separators`.
 //
 // Returns copies of the parts, none of them empty, in a new array for the caller to release with charray_free. A text of
-// separators only gives an array without elements. Null when memory ran out.
+// separators only gives an array without elements. Null when memory ran out, which is not told.
 DIRBASE_EXPORT char** str2charray(char* text, const char* separators);
 
 }  // extern "C"

@@ -115,17 +115,17 @@ int translate(ldap_iconv_t* conversion, const char* input, char** output, std::s
         return LDAP_NO_MEMORY;
     }
 
-    progress text = {const_cast<char*>(input), input_size, translated.get(),
+    progress state = {const_cast<char*>(input), input_size, translated.get(),
                      output_size};  // iconv only reads the input
-    const int rc = convert(conversion, text);
-    if (rc == -1 || text.in_left != 0) {
+    const int rc = convert(conversion, state);
+    if (rc == -1 || state.in_left != 0) {
         report(rc);
         PrintMessage(MSG_COMPONENT_RDBM, MSG_SEVERE, 29);
     }
-    if (text.in_left != 0)
+    if (state.in_left != 0)
         return -1;
     *output = translated.release();
-    *length = output_size - text.out_left;
+    *length = output_size - state.out_left;
     return 0;
 }
 

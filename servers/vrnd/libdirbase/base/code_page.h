@@ -3,7 +3,7 @@
 //
 // One conversion for each direction serves the whole process. They are opened once, before threads share them, by
 // initIconvHandle; after that the translations may be called from any thread: they take turns on a conversion. Opening
-// and releasing may not meet a translation.
+// (which the first getline_and_xlate does too) and releasing may not meet a translation.
 #pragma once
 
 #include <cstddef>

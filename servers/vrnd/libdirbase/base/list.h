@@ -64,8 +64,8 @@ public:
     List(const List&) = delete;
     List& operator=(const List&) = delete;
 
-    // Makes the list empty and its mutex, attributes and condition new. The constructor has done that; a second call is
-    // for memory whose list is not in use.
+    // Makes the list empty and its mutex, attributes and condition new. The constructor has done that: a call on a list in
+    // use leaks its entries and breaks its mutex.
     void init()
     {
         head = nullptr;

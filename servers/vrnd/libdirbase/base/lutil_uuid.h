@@ -5,6 +5,9 @@
 // node address is random with the top bit of the first byte set. The sequence shows in 13 bits, so a process can make 8192
 // identifiers in a second before one comes again.
 //
+// A process that forks gives its child the node address and the sequence that it has: the child must not make identifiers
+// unless it runs another program first.
+//
 // Every function may be called from any thread at any time.
 #pragma once
 

@@ -29,9 +29,9 @@ struct asyntaxinfo {
     std::int32_t index_action;            // 1 when an index is wanted
     std::int32_t system_column;           // 1 for the columns of creator, modifier and their times
     std::int32_t attr_id;                 // number of a well-known attribute, else -1
-    std::int32_t attr_class;              // 9 user, 2 configuration, others operational
+    std::int32_t attr_class;              // 9 user, 2 configuration, others operational (11 counts as neither in lists)
     char* table;                          // null when the server has no tables
-    char* short_table;                    // null for a table name without a qualifier
+    char* short_table;                    // null without tables, and for a table name without a qualifier
     std::int32_t access_class;            // 1 NORMAL, 2 SENSITIVE, 4 CRITICAL, 8 RESTRICTED, 16 SYSTEM, 32 OBJECT
     rdbm_col_info* attr;                  // the column of the values
     rdbm_col_info* trunc;                 // the column of the truncated values, null when none is needed

@@ -94,7 +94,11 @@ const T* find(const ldcf_map_name_to<T>& map, const char* name)
 [[gnu::noinline]] asyntaxinfo* uncached_info(const char* name, char** base_out)
 {
     heap_text base;
-    if (!split_language_tags(name, base)) {
+    const bool split = split_language_tags(name, base);
+    if (base_out != nullptr) {
+        *base_out = nullptr;
+    }
+    if (!split) {
         debug_error("ldcf_api_attr_get_info(): parse_language_tags() failed.\n");
         return nullptr;
     }

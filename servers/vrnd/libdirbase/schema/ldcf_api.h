@@ -20,13 +20,15 @@ extern "C" {
 
 // ---- life cycle, in this order ------------------------------------------------------------------------------------
 
-// Makes the schema lock and, at the first call, an empty name cache. Returns 0.
+// Makes the schema lock, forgets the kept schema entry without freeing it and, at the first call, empties the name cache.
+// Nobody may hold the lock. Returns 0.
 DIRBASE_EXPORT int ldcf_api_schema_init(void);
 
-// Reads one schema file into the active schema. Returns 0, or 1 when anything is wrong with it; the message log tells.
+// Reads one schema file into the active schema. Returns 0, or 1 when anything is wrong with it: the message log tells (it is
+// no longer quiet about exceptions from here on), and the definitions in front of the fault stay.
 DIRBASE_EXPORT int ldcf_api_schema_parse(const char* file);
 
-// Links and checks the active schema. Returns 0 or 1.
+// Links and checks the active schema. Returns 0, or 1 for a schema that can't be used.
 DIRBASE_EXPORT int ldcf_api_schema_complete(void);
 
 // Works out the names in the store, when the back ends are known, and fills the name cache. Returns 0 or 1.
@@ -34,6 +36,8 @@ DIRBASE_EXPORT int ldcf_api_schema_complete_db_names(void);
 
 // ---- the schemas and their lock -----------------------------------------------------------------------------------
 
+// The active schema, which is never null, and that of the change in progress: null before the first change, the active one
+// after a change that went through, and an empty one after a change that didn't.
 DIRBASE_EXPORT ldcf_schema* ldcf_api_get_schema_g(void);
 DIRBASE_EXPORT ldcf_schema* ldcf_api_get_schema_proposed_g(void);
 
@@ -42,7 +46,7 @@ DIRBASE_EXPORT ldcf_schema* ldcf_api_get_schema_proposed_g(void);
 DIRBASE_EXPORT extern rdbm_lock_t ldcf_api_modify_attr_info_lock_g;
 DIRBASE_EXPORT rdbm_lock_t* ldcf_api_get_modify_attr_info_lock_g(void);
 
-// How strictly entries are checked; 2 at start.
+// How strictly entries are checked; 2 at start. Set before other threads read it.
 DIRBASE_EXPORT extern std::int32_t ldcf_api_schema_check_g;
 DIRBASE_EXPORT void ldcf_api_set_schema_check(std::int32_t mode);
 DIRBASE_EXPORT std::int32_t ldcf_api_get_schema_check(void);
@@ -56,19 +60,23 @@ DIRBASE_EXPORT extern Entry* ldcf_api_schema_entry_g;
 // latter for types of binary syntax only). Null for a name that the schema lacks, a null or empty name, and a type that
 // can't have a record.
 //
-//   base_out  may be null; on a name that the cache doesn't hold it receives the name without its language tags, a text for
-//             the caller to free(), or null when it has none. On a hit and with ";binary" it is left alone.
+//   base_out  may be null. For a name that the cache doesn't hold it receives the name without its language tags, a text for
+//             the caller to free(), or null when it has none, its tags are too long (240 bytes) or memory ran out. For a name
+//             that the cache holds, one with ";binary", and a null or empty one it is left alone: the caller sets it to null.
 //
 // A name that the cache holds costs no allocation (RFC 4512 section 2.5, RFC 3866).
 DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info(const char* name, char** base_out);
 
-// The OID of an attribute type by name, as above but without language tags; owned by the type. Null when there is none.
+// The OID of an attribute type by name or OID, with or without "oid." in front and ";binary" behind (for types of any syntax);
+// owned by the type. Null for a name that the schema lacks, one with language tags, and a null or empty one.
 DIRBASE_EXPORT const char* ldcf_api_attr_get_oid(const char* name);
 
-// The record of an attribute type of the proposed schema, by plain name or OID.
+// The record of an attribute type of the proposed schema, by plain name or OID. Null when there is none, as for the active
+// schema, and before the first change; it goes with the proposed schema.
 DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info_from_proposed_schema(const char* name);
 
-// The record of the first type, in the order of names, whose values are in this table (without regard to case).
+// The record of the first type, in the order of keys (OIDs first, then names), whose values are in this table, without regard
+// to case; null when there is none.
 DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info_based_on_table(const char* table);
 
 // The record of an object class by name or OID; null when the schema lacks it.
@@ -78,19 +86,23 @@ DIRBASE_EXPORT objectclassinfo* ldcf_api_objectclass_get_info(const char* name);
 // function gives anything but 0.
 DIRBASE_EXPORT int ldcf_api_attrtype_apply(ldcf_attrtype_function function, void* argument);
 
-// Free a record that belongs to no definition.
+// Free a record that belongs to no definition; null does nothing. The first also empties the name cache: under the write side
+// of the schema lock.
 DIRBASE_EXPORT void ldcf_api_delete_asyntaxinfo(asyntaxinfo* info);
 DIRBASE_EXPORT void ldcf_api_delete_objectclassinfo(objectclassinfo* info);
 
-// Drops the record of an attribute type, so that the next look-up makes it anew, and empties the name cache. Under the write
-// side of the schema lock. A name that the schema lacks does nothing.
+// Drops the record of an attribute type, if it has one, so that the next look-up makes it anew, and empties the name cache,
+// which ldcf_api_load_attr_hash fills again. Under the write side of the schema lock. A name that the schema lacks does
+// nothing.
 DIRBASE_EXPORT void ldcf_api_attrtype_reset_info(const char* name);
 
-// The table of a record, and what to do with the text afterwards: nothing, it stays with the record.
+// The table of a record (null without tables; not to be changed), and what to do with the text afterwards: nothing, it stays
+// with the record.
 DIRBASE_EXPORT char* get_qualified_table_name(asyntaxinfo* info);
 DIRBASE_EXPORT void free_qualified_table_name(char* name);
 
-// Puts every name of the active schema's attribute types into the name cache.
+// Puts the names and OIDs of the active schema's attribute types into the name cache, but for types whose primary name is
+// there already or that have no record. At start-up or under the write side of the schema lock.
 DIRBASE_EXPORT void ldcf_api_load_attr_hash(void);
 
 // ---- predicates: false for a name that the schema lacks ---------------------------------------------------------------
@@ -107,18 +119,19 @@ DIRBASE_EXPORT bool ldcf_api_is_binary_syntax(const char* oid);     // takes the
 // False for the few attribute types that can't carry language tags, by OID.
 DIRBASE_EXPORT bool checkIfLangTagAttrByOid(const char* oid);
 
-// ---- lists: primary names in the order of names, a new null-terminated array for charray_free -------------------------
-// Null when memory ran out. What a list without members gives is said with it.
+// ---- lists: primary names, a new null-terminated array for charray_free ------------------------------------------------
+// In the order of the schema's keys: OIDs come first, so that of the OIDs. Null when memory ran out. What a list without
+// members gives is said with it.
 
 DIRBASE_EXPORT char** ldcf_api_get_langtag_attrs(void);         // null
 DIRBASE_EXPORT char** ldcf_api_get_nonlangtag_attrs(void);      // null
 DIRBASE_EXPORT char** ldcf_api_get_unique_attrs(void);          // null
-DIRBASE_EXPORT char** ldcf_api_get_nonunique_attrs(void);       // null
+DIRBASE_EXPORT char** ldcf_api_get_nonunique_attrs(void);       // null; not all that may not be unique
 DIRBASE_EXPORT char** ldcf_api_get_attrcache_attrs(void);       // null; user attributes
 DIRBASE_EXPORT char** ldcf_api_get_nonattrcache_attrs(void);    // null
 DIRBASE_EXPORT char** ldcf_api_get_config_attrs(void);          // null
 DIRBASE_EXPORT char** ldcf_api_get_nonconfig_attrs(void);       // null
-DIRBASE_EXPORT char** ldcf_api_get_operational_attrs(void);     // null
+DIRBASE_EXPORT char** ldcf_api_get_operational_attrs(void);     // null; without those of class 11
 DIRBASE_EXPORT char** ldcf_api_get_nonoperational_attrs(void);  // null
 DIRBASE_EXPORT char** ldcf_api_get_encryptable_attrs(void);     // an empty array
 DIRBASE_EXPORT char** ldcf_api_get_nonencryptable_attrs(void);  // an empty array
@@ -134,14 +147,15 @@ DIRBASE_EXPORT int ldcf_api_schema_contains_encrypted_attributes(void);
 DIRBASE_EXPORT const csgl_set<ldcf_attrtype>& ldcf_api_get_must_set_from_objclass(const ldcf_objclass& objclass);
 DIRBASE_EXPORT const csgl_set<ldcf_attrtype>& ldcf_api_get_may_set_from_objclass(const ldcf_objclass& objclass);
 
-// The definition under a name that the schema holds; there is no answer for another name.
+// The definition under a name that the schema holds; there is no answer for another name, nor without a proposed schema. It
+// lives as long as the schema holds it.
 DIRBASE_EXPORT const ldcf_attrtype& ldcf_api_get_attrtype_from_schema_g(const char* name);
 DIRBASE_EXPORT const ldcf_attrtype& ldcf_api_get_attrtype_from_proposed_schema_g(const char* name);
 DIRBASE_EXPORT const ldcf_objclass& ldcf_api_get_objclass_from_schema_g(const char* name);
 DIRBASE_EXPORT const ldcf_objclass& ldcf_api_get_objclass_from_proposed_schema_g(const char* name);
 
 // The record of the definition that a map holds under a name or an OID; null when the map lacks it or the record can't be
-// made. The second takes the first type, in the order of names, whose values are in this table.
+// made. The second takes the first type, in the order of keys, whose values are in this table.
 DIRBASE_EXPORT asyntaxinfo* ldcf_attrtype_get_info(const ldcf_map_name_to<ldcf_attrtype>& map, const char* name);
 DIRBASE_EXPORT asyntaxinfo* ldcf_attrtype_get_info_based_on_table(const ldcf_map_name_to<ldcf_attrtype>& map,
                                                                   const char* table);

@@ -21,7 +21,7 @@ struct class_pair {
     ldcf_objclass active;
     ldcf_objclass proposed;
 
-    bool complete() const { return active && proposed; }
+    bool in_both() const { return active && proposed; }
 };
 
 class_pair find_both(const ldcf_objclass& objclass)
@@ -109,7 +109,7 @@ csgl_set<csgl_string> superior_oids(const ldcf_objclass& objclass)
 ldcf_diff_info* ldcf_api_get_diff_info(const ldcf_objclass& objclass)
 try {
     const class_pair both = find_both(objclass);
-    if (!both.complete()) {
+    if (!both.in_both()) {
         return nullptr;
     }
     return make_record(
@@ -121,7 +121,7 @@ try {
 int ldcf_api_compare_type(const ldcf_objclass& objclass)
 {
     const class_pair both = find_both(objclass);
-    if (!both.complete()) {
+    if (!both.in_both()) {
         return -1;
     }
     return both.active->kind() == both.proposed->kind() ? 0 : 1;
@@ -130,7 +130,7 @@ int ldcf_api_compare_type(const ldcf_objclass& objclass)
 int ldcf_api_compare_SUP(const ldcf_objclass& objclass)
 try {
     const class_pair both = find_both(objclass);
-    if (!both.complete()) {
+    if (!both.in_both()) {
         return -1;
     }
     return superior_oids(both.active) == superior_oids(both.proposed) ? 0 : 1;

@@ -16,7 +16,7 @@ namespace {
 // A property of an attribute type; each is asked for one name by a predicate, and of all types by a list.
 using property = bool (*)(const ldcf_attrtype_& attribute);
 
-constexpr int attr_class_neither = 11;  // counts neither as operational nor as user attribute in the lists
+constexpr int attr_class_unlisted = 11;  // counts as operational, but not in the list of those
 
 constexpr std::string_view oids_without_tags[] = {
     "2.5.4.0",
@@ -55,7 +55,7 @@ bool may_not_be_unique(const ldcf_attrtype_& a)
     return !is_user(a) || is_cn_or_objectclass(a) || a.syntax_oid() == ldcf_syntax_binary;
 }
 bool is_operational(const ldcf_attrtype_& a) { return !is_user(a) && !is_configuration(a); }
-bool is_listed_operational(const ldcf_attrtype_& a) { return is_operational(a) && a.attr_class() != attr_class_neither; }
+bool is_listed_operational(const ldcf_attrtype_& a) { return is_operational(a) && a.attr_class() != attr_class_unlisted; }
 bool is_encryptable(const ldcf_attrtype_& a) { return a.may_be_encrypted(); }
 bool is_encrypted(const ldcf_attrtype_& a) { return a.encryption() != ldcf_encryption::none; }
 bool is_protected(const ldcf_attrtype_& a)
@@ -70,7 +70,7 @@ bool opposite(const ldcf_attrtype_& attribute)
     return !has(attribute);
 }
 
-bool ask(const char* name, property has)
+bool type_has(const char* name, property has)
 {
     if (name == nullptr) {
         return false;
@@ -100,16 +100,16 @@ char** make_array(const csgl_vector<const char*>& names)
     return array.release();
 }
 
-char** list(property has, without_members nothing = without_members::null)
+char** names_of_types_with(property wanted, without_members if_none = without_members::null)
 try {
     ldcf_names seen;
     csgl_vector<const char*> names;
     for (const auto& [key, attribute] : ldcf_schema_g->attribute_types) {
-        if (has(*attribute) && seen.insert(attribute.name()).second) {
+        if (wanted(*attribute) && seen.insert(attribute.name()).second) {
             names.push_back(attribute.name());
         }
     }
-    return names.empty() && nothing == without_members::null ? nullptr : make_array(names);
+    return names.empty() && if_none == without_members::null ? nullptr : make_array(names);
 } catch (const exc_not_enough_memory_t&) {
     return nullptr;
 }
@@ -126,28 +126,28 @@ bool ldcf_api_is_binary_syntax(const char* oid)
     return oid != nullptr && holds(binary_syntaxes, oid);
 }
 
-bool ldcf_api_is_langtag_attr(const char* name) { return ask(name, takes_language_tags); }
-bool ldcf_api_is_unique_attr(const char* name) { return ask(name, may_be_unique); }
-bool ldcf_api_is_attrcache_attr(const char* name) { return ask(name, opposite<is_user>); }
-bool ldcf_api_is_config_attr(const char* name) { return ask(name, is_configuration); }
-bool ldcf_api_is_operational_attr(const char* name) { return ask(name, is_operational); }
-bool ldcf_api_is_encryptable_attr(const char* name) { return ask(name, is_encryptable); }
-bool ldcf_api_is_encrypted_attr(const char* name) { return ask(name, is_encrypted); }
+bool ldcf_api_is_langtag_attr(const char* name) { return type_has(name, takes_language_tags); }
+bool ldcf_api_is_unique_attr(const char* name) { return type_has(name, may_be_unique); }
+bool ldcf_api_is_attrcache_attr(const char* name) { return type_has(name, opposite<is_user>); }
+bool ldcf_api_is_config_attr(const char* name) { return type_has(name, is_configuration); }
+bool ldcf_api_is_operational_attr(const char* name) { return type_has(name, is_operational); }
+bool ldcf_api_is_encryptable_attr(const char* name) { return type_has(name, is_encryptable); }
+bool ldcf_api_is_encrypted_attr(const char* name) { return type_has(name, is_encrypted); }
 
-char** ldcf_api_get_langtag_attrs(void) { return list(takes_language_tags); }
-char** ldcf_api_get_nonlangtag_attrs(void) { return list(opposite<takes_language_tags>); }
-char** ldcf_api_get_unique_attrs(void) { return list(may_be_unique); }
-char** ldcf_api_get_nonunique_attrs(void) { return list(may_not_be_unique); }
-char** ldcf_api_get_attrcache_attrs(void) { return list(is_user); }
-char** ldcf_api_get_nonattrcache_attrs(void) { return list(opposite<is_user>); }
-char** ldcf_api_get_config_attrs(void) { return list(is_configuration); }
-char** ldcf_api_get_nonconfig_attrs(void) { return list(opposite<is_configuration>); }
-char** ldcf_api_get_operational_attrs(void) { return list(is_listed_operational); }
-char** ldcf_api_get_nonoperational_attrs(void) { return list(opposite<is_listed_operational>); }
-char** ldcf_api_get_encryptable_attrs(void) { return list(is_encryptable, without_members::empty_array); }
-char** ldcf_api_get_nonencryptable_attrs(void) { return list(opposite<is_encryptable>, without_members::empty_array); }
-char** ldcf_api_get_encrypted_attrs(void) { return list(is_protected, without_members::empty_array); }
-char** ldcf_api_get_nonencrypted_attrs(void) { return list(opposite<is_protected>, without_members::empty_array); }
+char** ldcf_api_get_langtag_attrs(void) { return names_of_types_with(takes_language_tags); }
+char** ldcf_api_get_nonlangtag_attrs(void) { return names_of_types_with(opposite<takes_language_tags>); }
+char** ldcf_api_get_unique_attrs(void) { return names_of_types_with(may_be_unique); }
+char** ldcf_api_get_nonunique_attrs(void) { return names_of_types_with(may_not_be_unique); }
+char** ldcf_api_get_attrcache_attrs(void) { return names_of_types_with(is_user); }
+char** ldcf_api_get_nonattrcache_attrs(void) { return names_of_types_with(opposite<is_user>); }
+char** ldcf_api_get_config_attrs(void) { return names_of_types_with(is_configuration); }
+char** ldcf_api_get_nonconfig_attrs(void) { return names_of_types_with(opposite<is_configuration>); }
+char** ldcf_api_get_operational_attrs(void) { return names_of_types_with(is_listed_operational); }
+char** ldcf_api_get_nonoperational_attrs(void) { return names_of_types_with(opposite<is_listed_operational>); }
+char** ldcf_api_get_encryptable_attrs(void) { return names_of_types_with(is_encryptable, without_members::empty_array); }
+char** ldcf_api_get_nonencryptable_attrs(void) { return names_of_types_with(opposite<is_encryptable>, without_members::empty_array); }
+char** ldcf_api_get_encrypted_attrs(void) { return names_of_types_with(is_protected, without_members::empty_array); }
+char** ldcf_api_get_nonencrypted_attrs(void) { return names_of_types_with(opposite<is_protected>, without_members::empty_array); }
 
 int ldcf_api_schema_contains_encrypted_attributes(void)
 {

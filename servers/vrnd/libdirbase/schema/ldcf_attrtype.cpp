@@ -303,6 +303,6 @@ bool ldcf_attrtype_set_equal(const csgl_set<ldcf_attrtype>& a, const csgl_set<ld
 
 const char* ldcf_attrtype_get_oid(const ldcf_map_name_to<ldcf_attrtype>& map, const char* name)
 {
-    const ldcf_attrtype found = ldcf_find<ldcf_attrtype>(map, name);
-    return found ? found.oid().c_str() : nullptr;
+    const auto found = name == nullptr ? map.end() : map.find(name);
+    return found == map.end() ? nullptr : found->second.oid().c_str();
 }

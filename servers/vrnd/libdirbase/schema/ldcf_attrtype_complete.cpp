@@ -271,6 +271,7 @@ void ldcf_attrtype_::incomplete()
     inherited_asked_.clear();
     table_ = csgl_string();
     column_ = csgl_string();
+    info_.reset();
     state_ = ldcf_attrtype_state::both_defined;
 }
 
@@ -293,5 +294,6 @@ void ldcf_attrtype_::complete_db_names()
     column_ = ldcf_rdbm::normalize_column_name(column_name);
     table_ = ldcf_rdbm::normalize_table_name(table_name, static_cast<int>(access_class_),
                                              static_cast<int>(db_names_.size()));
+    info_.reset();  // one asked for ahead of time has neither table nor column
     state_ = ldcf_attrtype_state::db_names_complete;
 }

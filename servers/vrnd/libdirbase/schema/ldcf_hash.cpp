@@ -115,12 +115,11 @@ void ldcf_node_index::clear()
 
 // ---- the cache --------------------------------------------------------------------------------------------------------
 
-std::uint32_t ldcf_hash_name(const char* text)
+std::uint32_t ldcf_hash_name(const char* key)
 {
     std::uint32_t hash = 0;
-    for (; *text != '\0'; ++text) {
-        const auto c = static_cast<std::int32_t>(static_cast<signed char>(ldcf_fold_key(*text)));
-        hash = hash * 16 + static_cast<std::uint32_t>(c);
+    for (; *key != '\0'; ++key) {
+        hash = hash * 16 + static_cast<std::uint32_t>(static_cast<std::int32_t>(static_cast<signed char>(*key)));
         const std::uint32_t high = hash & 0xf0000000u;
         hash = (hash ^ high >> 24) & ~high;
     }

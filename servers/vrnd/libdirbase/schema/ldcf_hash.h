@@ -23,8 +23,8 @@ struct ldcf_hash_tbl_entry {
 
 extern "C" {
 
-// The slot of a name, without regard to case: the hash of ELF symbol tables over its bytes, folded and taken as signed.
-DIRBASE_EXPORT std::uint32_t ldcf_hash_name(const char* text);
+// The slot of a key: the hash of ELF symbol tables over its bytes as they stand, taken as signed. A name is folded first.
+DIRBASE_EXPORT std::uint32_t ldcf_hash_name(const char* key);
 
 // The node of a name, without regard to case (only bytes from 'a' to 0x7f fold); null when the cache lacks it, the name is
 // null or has more than ldcf_hash_longest_key bytes.

@@ -231,7 +231,7 @@ private:
     }
 
     // A case-exact rule makes a text's syntax case-exact.
-    void apply_case(unsigned rule)
+    void keep_case_if_exact(unsigned rule)
     {
         if (rule == SC_CES && (info_.syntax & SC_CIS) != 0) {
             info_.syntax = SC_CES;
@@ -240,19 +240,19 @@ private:
 
     bool fill_codes()
     {
-        const int shift = static_cast<int>(attribute_.access_class());
-        info_.access_class = shift >= 0 && shift <= 5 ? 1 << shift : 1;
+        const int class_index = static_cast<int>(attribute_.access_class());
+        info_.access_class = class_index >= 0 && class_index <= 5 ? 1 << class_index : 1;
         info_.syntax = find_syntax(attribute_.syntax_oid());
         if (info_.syntax == 0) {
             debug_error("ldcf_rdbm::fill_ayntaxinfo: Invalid syntax: %s\n", attribute_.syntax_oid().c_str());
             return false;
         }
         info_.equality = find_rule(equality_codes, attribute_.equality());
-        apply_case(info_.equality);
+        keep_case_if_exact(info_.equality);
         info_.substring = find_rule(substring_codes, attribute_.substr());
-        apply_case(info_.substring);
+        keep_case_if_exact(info_.substring);
         info_.ordering = find_rule(ordering_codes, attribute_.ordering());
-        apply_case(info_.ordering);
+        keep_case_if_exact(info_.ordering);
         return true;
     }
 
@@ -269,9 +269,9 @@ private:
 
     bool fill_columns()
     {
-        const bool text = (info_.syntax & text_or_dn) != 0;
+        const bool is_text_or_dn = (info_.syntax & text_or_dn) != 0;
         int length = attribute_.effective_length();
-        if (length == 0 && text) {
+        if (length == 0 && is_text_or_dn) {
             length = indexable_length;
         }
         const csgl_string& name = attribute_.column();
@@ -284,13 +284,13 @@ private:
         }
         info_.attr_id = attribute_.attr_id();
         info_.attr_class = attribute_.attr_class();
-        if (text && length > longest_text_column) {
+        if (is_text_or_dn && length > longest_text_column) {
             debug_error("ldcf_rdbm::fill_asyntaxinfo():attr size %d exceed max longvarchar length %d\n", length,
                         longest_text_column);
             return false;
         }
         info_.attr->length = static_cast<std::uint16_t>(std::clamp<int>(length, 0, longest_column));
-        return !text || length <= indexable_length || info_.system_column != 0 || fill_trunc(name);
+        return !is_text_or_dn || length <= indexable_length || info_.system_column != 0 || fill_trunc(name);
     }
 
     bool fill_trunc(const csgl_string& name)

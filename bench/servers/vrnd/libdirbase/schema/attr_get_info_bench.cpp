@@ -77,7 +77,7 @@ double mean_chain(const std::vector<std::string>& names)
     std::unordered_map<std::uint32_t, std::size_t> used;
     double nodes = 0;
     for (const std::string& name : names) {
-        nodes += static_cast<double>(++used[ldcf_hash_name(name.c_str())]);
+        nodes += static_cast<double>(++used[ldcf_hash_name(ldcf_hash_get(name.c_str())->name)]);
     }
     return nodes / static_cast<double>(names.size());
 }

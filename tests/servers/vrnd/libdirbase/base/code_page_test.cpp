@@ -2,11 +2,9 @@
 // library, so that the local code page can be any, and every conversion opened is counted until it is closed.
 #include <gtest/gtest.h>
 
-#include <array>
 #include <atomic>
 #include <cstddef>
 #include <cstdio>
-#include <cstdlib>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -18,6 +16,7 @@
 
 #include "libraries/libber/ldap_iconv.h"
 #include "servers/vrnd/libdirbase/base/code_page.h"
+#include "servers/vrnd/libdirbase/base/heap.h"
 #include "tests/support/message_catcher.h"
 #include "tests/support/temp_dir.h"
 
@@ -67,11 +66,6 @@ int ldap_iconv_close(ldap_iconv_t* conversion)
 }  // extern "C"
 
 namespace {
-
-struct free_text {
-    void operator()(char* text) const { std::free(text); }
-};
-using heap_text = std::unique_ptr<char, free_text>;
 
 struct translated {
     int result;
@@ -201,21 +195,14 @@ TEST_F(CodePage, WhatCantBeTranslatedIsReportedAndLeavesNoText)
     }
 }
 
-TEST_F(CodePage, NullIsNoText)
-{
-    ASSERT_EQ(initIconvHandle(), 0);
-    for (const auto function : {xlate_localcp_to_utf8, xlate_utf8_to_localcp}) {
-        const translated found = translate(function, nullptr);
-        EXPECT_EQ(found.result, 0);
-        EXPECT_TRUE(found.null);
-    }
-}
-
-TEST_F(CodePage, ATextWithoutAConversionFails)
+TEST_F(CodePage, NullIsNoTextAndATextWithoutAConversionFails)
 {
     const message_catcher messages;
-    EXPECT_EQ(translate(xlate_localcp_to_utf8, "text").result, -1);
-    EXPECT_EQ(translate(xlate_utf8_to_localcp, "text").result, -1);
+    for (const auto function : {xlate_localcp_to_utf8, xlate_utf8_to_localcp}) {
+        EXPECT_EQ(translate(function, nullptr).result, 0);
+        EXPECT_TRUE(translate(function, nullptr).null);
+        EXPECT_EQ(translate(function, "text").result, -1);
+    }
     EXPECT_EQ(messages.count(7, 29), 2u);
 }
 
@@ -237,20 +224,6 @@ TEST_F(CodePage, OpeningIsDoneOnceAndAgainAfterRelease)
         EXPECT_EQ(open_conversions, 2);
     }
     EXPECT_EQ(translate(xlate_localcp_to_utf8, "\xC1").text, std::string("\u0430", 3));
-}
-
-TEST_F(CodePage, ALineReaderThatOpenedFirstIsNoLeak)
-{
-    const temp_dir dir;
-    const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(std::fopen(dir.write("a", "a\n").c_str(), "r"),
-                                                               std::fclose);
-    std::array<char, 1024> line = {};
-    set_cfg_xlate_on();
-    ASSERT_EQ(getline_and_xlate(line.data(), file.get()), 0);
-    EXPECT_EQ(open_conversions, 1);
-    ASSERT_EQ(initIconvHandle(), 0);
-    EXPECT_EQ(open_conversions, 2);
-    EXPECT_EQ(translate(xlate_utf8_to_localcp, "\u00E9").text, std::string("\xE9", 2));
 }
 
 TEST_F(CodePage, ACodePageThatIsNotKnownIsReportedAndTriedAgain)
@@ -285,48 +258,41 @@ TEST_F(CodePage, ACodePageThatIsNotKnownIsReportedAndTriedAgain)
     EXPECT_EQ(initIconvHandle(), 0);
 }
 
-TEST_F(CodePage, LinesComeAsTheyStandInPiecesOfTheBuffersSize)
+TEST_F(CodePage, LinesComeAsTheyStandInPiecesOfTheBuffersSizeOrNotAtAll)
 {
     const temp_dir dir;
     const std::string long_line(1500, 'x');
     const std::string path = dir.write("conf", "first \xE9\n\n" + long_line + "\nno line feed");
-    for (const std::int32_t xlate : {0, 1}) {
-        cfg_xlate = xlate;
+    const std::unique_ptr<char[]> line(new char[1024]);
+    const auto lines_of_file = [&] {
         const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(std::fopen(path.c_str(), "r"), std::fclose);
-        const std::unique_ptr<char[]> line(new char[1024]);
         std::vector<std::string> lines;
-        while (getline_and_xlate(line.get(), file.get()) == 0)
+        while (getline_and_xlate(line.get(), file.get()) == 0) {
             lines.emplace_back(line.get());
-        EXPECT_EQ(lines, (std::vector<std::string>{"first \xE9\n", "\n", long_line.substr(0, 1023),
-                                                   long_line.substr(1023) + "\n", "no line feed"}));
-        EXPECT_EQ(open_conversions, xlate);
-    }
-}
+        }
+        return lines;
+    };
+    const std::vector<std::string> all = {"first \xE9\n", "\n", long_line.substr(0, 1023), long_line.substr(1023) + "\n",
+                                          "no line feed"};
+    EXPECT_EQ(lines_of_file(), all);
+    EXPECT_EQ(open_conversions, 0);
 
-TEST_F(CodePage, ALineReaderWithoutAConversionReadsNothing)
-{
-    const temp_dir dir;
-    const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(std::fopen(dir.write("a", "a\nb\n").c_str(), "r"),
-                                                               std::fclose);
-    std::array<char, 1024> line = {};
     set_cfg_xlate_on();
-    EXPECT_NE(cfg_xlate, 0);
     const message_catcher messages;
     const debug_catcher debug;
-
-    platform_says(nullptr);
-    EXPECT_EQ(getline_and_xlate(line.data(), file.get()), -1);
-    EXPECT_EQ(messages.count(), 0u);
-    platform_says("NO-SUCH-PAGE");
-    EXPECT_EQ(getline_and_xlate(line.data(), file.get()), -1);
+    for (const char* codepage : {static_cast<const char*>(nullptr), "NO-SUCH-PAGE"}) {
+        platform_says(codepage);
+        EXPECT_EQ(lines_of_file(), std::vector<std::string>());
+    }
     EXPECT_EQ(messages.count(7, 28), 1u);
     EXPECT_EQ(debug.texts(),
               (std::vector<std::string>{"Error - getline_and_xlate: ldap_nl_langinfo() failed\n",
                                         "Error - getline_and_xlate: ldap_iconv_open() failed errno=22\n"}));
-
     platform_says("ISO-8859-1");
-    EXPECT_EQ(getline_and_xlate(line.data(), file.get()), 0);
-    EXPECT_STREQ(line.data(), "a\n");
+    EXPECT_EQ(lines_of_file(), all);
+    EXPECT_EQ(open_conversions, 1);
+    ASSERT_EQ(initIconvHandle(), 0);
+    EXPECT_EQ(open_conversions, 2);  // what the reader opened is closed
 }
 
 TEST_F(CodePage, ThreadsShareTheConversions)

@@ -132,7 +132,7 @@ TEST(LdcfApi, NamesAreFoundUnderEverySpelling)
         {";", nullptr, "", nullptr},
         {"x;TAG", "7.5", "(untouched)", "7.5"},
         {"cn;" + tag, "2.5.4.3", "cn", nullptr},
-        {"cn;" + tag + "t", nullptr, "(untouched)", nullptr},
+        {"cn;" + tag + "t", nullptr, nullptr, nullptr},
         {"cert;Binary", "7.2", "(untouched)", "7.2"},  // whoever is called that
         {"7.2;binary", "7.2", "(untouched)", "7.2"},
         {"cn;binary", nullptr, "(untouched)", "2.5.4.3"},
@@ -178,6 +178,10 @@ TEST(LdcfApi, NamesAreFoundUnderEverySpelling)
 TEST(LdcfApi, RecordsAreFoundByTableAndMadeAnewAfterAReset)
 {
     const active_schema schema;
+    ldcf_schema_g->incomplete();  // a record asked for between the steps of the life cycle has no table yet
+    ldcf_schema_g->complete();
+    EXPECT_STREQ(ldcf_api_attr_get_info("userPassword", nullptr)->table, "");
+    EXPECT_EQ(ldcf_api_schema_complete_db_names(), 0);
     EXPECT_EQ(ldcf_api_attr_get_info_based_on_table("USERPASSWORD"), ldcf_api_attr_get_info("userPassword", nullptr));
     EXPECT_EQ(ldcf_api_attr_get_info_based_on_table("userpassword"), ldcf_api_attr_get_info("userPassword", nullptr));
     EXPECT_EQ(ldcf_api_attr_get_info_based_on_table("nowhere"), nullptr);

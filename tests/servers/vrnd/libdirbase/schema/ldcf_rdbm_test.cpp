@@ -8,12 +8,12 @@ using test_support::message_catcher;
 
 namespace {
 
-// The digits of the slot of a name in a table of 7001: a slow form of the hash of ELF symbol tables over upper case.
+// The digits of the slot of a name in a table of 7001: a slow form of the hash of ELF symbol tables.
 std::string slot_digits(const std::string& name)
 {
     unsigned long long h = 0;
     for (const char c : name) {
-        h = (h * 16 + static_cast<unsigned long long>(c >= 'a' ? c - 32 : c)) % 0x100000000ull;
+        h = (h * 16 + static_cast<unsigned long long>(c)) % 0x100000000ull;
         h = (h ^ (h / 0x10000000ull * 16)) % 0x10000000ull;
     }
     std::string digits;
