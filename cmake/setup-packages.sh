@@ -11,7 +11,10 @@ packages=()
 for job in "$@"; do
     case $job in
         # The library, the tool and the tests.
-        build) packages+=(g++ cmake ninja-build libcli11-dev nlohmann-json3-dev libgtest-dev libgmock-dev libmd-dev) ;;
+        build)
+            packages+=(g++ cmake ninja-build libcli11-dev nlohmann-json3-dev libgtest-dev libgmock-dev)
+            packages+=(libmd-dev libssl-dev libcrypt-dev)
+            ;;
         bench) packages+=(libbenchmark-dev) ;;
         # llvm brings the symbolizer, without which a finding is a list of addresses.
         fuzz) packages+=(clang libclang-rt-14-dev llvm) ;;

@@ -1,15 +1,18 @@
 #!/usr/bin/env bash
-# Makes the seeds of the schema fuzzers again from the shipped schema; run it when the schema or its grammar changed.
+# Makes the seeds of the fuzzers again, those of the schema's from the shipped schema; run it when the schema or a grammar
+# changed.
 #
 #   fuzz/make_seeds.sh
 #
 # parse_str_fuzz gets one definition of each shape (the sequence of its keywords), with the extended one that belongs to
-# it. token_fuzz gets the beginnings of some files, stream_fuzz one text for each reader.
+# it. token_fuzz gets the beginnings of some files, stream_fuzz one text for each reader, time_fuzz one for each form, and
+# the fuzzers of DNs a DN a line.
 set -euo pipefail
 cd "$(dirname "$0")"
 schema=../share/schema
-rm -rf corpus/parse_str_fuzz corpus/token_fuzz corpus/stream_fuzz
-mkdir -p corpus/parse_str_fuzz corpus/token_fuzz corpus/stream_fuzz
+fuzzers=(parse_str_fuzz token_fuzz stream_fuzz time_fuzz dn_normalize_esc_fuzz dn_plain_fuzz)
+rm -rf "${fuzzers[@]/#/corpus/}"
+mkdir -p "${fuzzers[@]/#/corpus/}"
 
 # Definitions are read as lists of words up to the parenthesis that closes them; what is quoted is one word.
 cat $schema/V3.*.sx $schema/V3.*.mr $schema/V3.*.at $schema/V3.*.oc | awk -v out=corpus/parse_str_fuzz -v limit=18 '
@@ -99,3 +102,25 @@ for i in "${!readers[@]}"; do
     printf '%s%s' "$i" "${readers[$i]}" >"corpus/stream_fuzz/$i"
 done
 printf '1( )' >corpus/stream_fuzz/empty-list
+
+times=(20240229123456Z 20231231233000.5-0100 00010101000000,1234567+0001 20240701120000 2402291234Z 491231233000-0030
+       5001010000+9999)
+for i in "${!times[@]}"; do
+    printf '%s' "${times[$i]}" >"corpus/time_fuzz/$i"
+done
+
+number=0
+while IFS= read -r dn; do
+    number=$((number + 1))
+    printf '%s' "$dn" >"corpus/dn_normalize_esc_fuzz/$number"
+    printf '%s' "$dn" >"corpus/dn_plain_fuzz/$number"
+done <<'END'
+CN=Bob Smith , c=Acme ; commonName=us
+x=B+cn=a, 2.3=\#c, oid.1.1="d,\"e\"" ;exact=F
+sn=b + cn=a\,b + commonName="c" , name=#0403414243
+1.1=a+1.1=b+1.1=c,1.1=d
+cn=\ a\ ,cn=a\20  ,cn=" a ",c=\C3\A9
+cn=,x=\\ ,c="\<\=\>;+"
+xan-kerberosname=abc,name=#41 ,cn=a\b
+a.b@c.d
+END

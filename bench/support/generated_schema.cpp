@@ -249,7 +249,7 @@ std::string shipped_schema_text()
 
 void provide_backend()
 {
-    static Backend relational_store{"rdbm"};
+    static Backend relational_store{.be_type = "rdbm"};
     g_backends = &relational_store;
 }
 

@@ -12,7 +12,7 @@ namespace fuzz_support {
 
 namespace {
 
-Backend relational_store{"rdbm"};
+Backend relational_store{.be_type = "rdbm"};
 
 [[maybe_unused]] const bool prepared = [] {
     set_message_sink([](void*, const message_record&) {}, nullptr);

@@ -86,6 +86,7 @@ constexpr catalogue_entry catalogue[] = {
     {MSG_COMPONENT_SCHEMA, 49,
      "The %1$s matching rule %2$s of attribute %3$s differs from its EQUALITY matching rule in case sensitivity."},
 
+    {MSG_COMPONENT_RDBM, 13, "The attribute %1$s is not defined in the schema."},
     {MSG_COMPONENT_RDBM, 28, "The conversion between UTF-8 and the local code page %1$s is not available."},
     {MSG_COMPONENT_RDBM, 29, "A text could not be converted between UTF-8 and the local code page."},
     {MSG_COMPONENT_RDBM, 30, "The table name %1$s is too long for the store and has been cut to %2$s."},

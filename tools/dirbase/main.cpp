@@ -4,7 +4,7 @@
 #include <new>
 #include <sstream>
 
-#include "tools/dirbase/schema_commands.h"
+#include "tools/dirbase/data_commands.h"
 
 namespace dirbase_tool {
 
@@ -50,6 +50,11 @@ definition in a second section; without one, replace takes the old one away. For
 names count, and names need not be given.
 )";
 
+constexpr char dn_details[] =
+    R"(DNs are looked up in the schema, so every spelling of a DN has one normal form. A DN that is - stands for
+those on standard input, one a line. Each DN has its answer, in their order.
+)";
+
 struct options {
     common_options common;
     std::vector<std::string> files;
@@ -59,6 +64,8 @@ struct options {
     std::string property;
     std::string before;
     std::string after;
+    std::vector<std::string> dns;
+    bool light = false;
     std::string operation;
     std::string definition_file;
 };
@@ -227,6 +234,46 @@ void add_modify(CLI::App& group, options& given, command& chosen)
     });
 }
 
+void add_light(CLI::App& app, options& given)
+{
+    app.add_flag("--light", given.light, "Do without the schema: types stay as they are written");
+}
+
+void add_dn_question(CLI::App& group, const std::string& name, const std::string& description, dn_question question,
+                     options& given, command& chosen)
+{
+    CLI::App* app = add_command(group, name, description, dn_details, given.common);
+    app->add_option("DN", given.dns, "Distinguished names, - for standard input")->type_name("")->required();
+    if (question != dn_question::check) {
+        add_light(*app, given);
+    }
+    app->callback([&given, &chosen, question] {
+        chosen = [&given, question](message_collector&) {
+            return ask_of_dns(given.common, question, given.dns, given.light);
+        };
+    });
+}
+
+void add_dn_group(CLI::App& app, options& given, command& chosen)
+{
+    CLI::App* group = app.add_subcommand("dn", "Normalise, check and compare distinguished names");
+    add_flags_of_all(*group);
+    expect_subcommand(*group);
+    add_dn_question(*group, "normalize", "Print the canonical and the upper text of DNs", dn_question::normalize, given,
+                    chosen);
+    add_dn_question(*group, "check", "Tell whether DNs keep to the strict grammar", dn_question::check, given, chosen);
+    add_dn_question(*group, "parent", "Print the canonical text of the parents of DNs", dn_question::parent, given,
+                    chosen);
+    CLI::App* compare = add_command(*group, "compare", "Tell whether two DNs are the same", "", given.common);
+    compare->add_option("DN", given.dns, "The two DNs")->type_name("")->required()->expected(2);
+    add_light(*compare, given);
+    compare->callback([&given, &chosen] {
+        chosen = [&given](message_collector&) {
+            return compare_dns(given.common, given.dns[0], given.dns[1], given.light);
+        };
+    });
+}
+
 // Tells a failure, to the eyes and with --json to programs, and gives its exit status.
 int report(const tool_failure& failure, bool as_json)
 {
@@ -295,6 +342,7 @@ int main_of_tool(int argc, char** argv)
     add_list(*schema, given, chosen);
     add_diff(*schema, given, chosen);
     add_modify(*schema, given, chosen);
+    add_dn_group(app, given, chosen);
 
     try {
         app.parse(argc, argv);

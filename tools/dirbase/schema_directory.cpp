@@ -12,6 +12,7 @@
 #include <string_view>
 
 #include "servers/vrnd/libdirbase/base/backend.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_api.h"
 #include "tools/dirbase/report.h"
 #include "tools/dirbase/text_file.h"
 
@@ -68,7 +69,7 @@ std::string_view without_blanks(std::string_view line)
 // Table names depend on there being a relational back end. The tool has no store behind it, and needs none.
 void announce_relational_store()
 {
-    static Backend relational_store = {"rdbm"};
+    static Backend relational_store = {.be_type = "rdbm"};
     g_backends = &relational_store;
 }
 
@@ -162,6 +163,13 @@ void schema_directory::load_other(ldcf_schema& schema,
         parse_schema_text(schema, read_text(stand_in(file.path), text_source::regular_file), file.path, file.path);
     }
     complete(schema);
+}
+
+void load_for_names(const std::string& folder)
+{
+    const schema_directory directory(folder, schema_directory::purpose::read);
+    directory.load();
+    ldcf_api_load_attr_hash();
 }
 
 // ldcf_schema::parse would read the file again, and perhaps not what was looked at; it also stops in silence at a

@@ -55,6 +55,9 @@ private:
     std::vector<listed_file> files_;
 };
 
+// Loads a directory, as above, for commands that look names up in it.
+void load_for_names(const std::string& folder);
+
 // Parses a schema text; `path` is the home of its definitions, and `source` its name in messages. Raises tool_failure
 // with the line for a fault at a place in the text.
 void parse_schema_text(ldcf_schema& schema, const std::string& text, const std::string& path,

@@ -9,6 +9,7 @@ struct asyntaxinfo;
 
 // Texts and functions belong to whoever fills the record; a function pointer may be null.
 struct Backend {
+    char** be_suffix = nullptr;     // suffixes, each the upper text of dn_normalize_esc; ended by a null pointer
     const char* be_type = nullptr;  // "rdbm" for the relational store, "proxy", "ldcf" for the schema store
     Backend* be_next = nullptr;     // next on the list
 

@@ -20,8 +20,6 @@ namespace {
 
 constexpr std::size_t longest_tag = 240;
 
-constexpr char oid_prefix[] = "oid.";
-constexpr std::size_t oid_prefix_length = sizeof(oid_prefix) - 1;
 constexpr char binary_suffix[] = ";binary";
 constexpr std::size_t binary_suffix_length = sizeof(binary_suffix) - 1;
 
@@ -40,9 +38,10 @@ int guarded(const char* failure, Step&& step)
 
 const char* skip_oid_prefix(const char* name)
 {
+    constexpr char to_lower = 'a' - 'A';
     const bool prefixed =
-        (*name == 'o' || *name == 'O') && strncasecmp(name, oid_prefix, oid_prefix_length) == 0;
-    return prefixed ? name + oid_prefix_length : name;
+        (name[0] | to_lower) == 'o' && (name[1] | to_lower) == 'i' && (name[2] | to_lower) == 'd' && name[3] == '.';
+    return prefixed ? name + 4 : name;
 }
 
 // Whether a name ends in ";binary", with something in front of it.

@@ -31,6 +31,9 @@ public:
     // log. Raises exc_not_enough_memory_t.
     static csgl_string normalize_column_name(const csgl_string& name);
 
+    // The syntax code (base/syntax_codes.h) by which values of a syntax are held; 0 for a syntax without one.
+    static std::uint32_t syntax_code(const csgl_string& oid);
+
     // A new record of a complete attribute type whose names in the store are known, or null, with the reason in the debug log: memory ran out, the syntax is
     // none that values can be compared by, or a text column would be longer than the 32700 bytes that the store takes.
     // Lengths of other columns are given up to 65535.

@@ -365,6 +365,11 @@ bool add_class_name(objectclassinfo& info, const csgl_string& name)
 
 }  // namespace
 
+std::uint32_t ldcf_rdbm::syntax_code(const csgl_string& oid)
+{
+    return find_syntax(oid);
+}
+
 asyntaxinfo* ldcf_rdbm::fill_asyntaxinfo(const ldcf_attrtype& attribute)
 {
     auto* info = static_cast<asyntaxinfo*>(std::calloc(1, sizeof(asyntaxinfo)));

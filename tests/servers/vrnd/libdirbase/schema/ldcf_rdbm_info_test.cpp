@@ -64,7 +64,7 @@ ldcf_attrtype type_of(ldcf_schema& schema, const std::string& definition, const 
 // "syntax equality substring ordering", in hexadecimal, of a record without names and lengths that matter.
 std::string codes(const std::string& definition)
 {
-    Backend rdbm{"rdbm"};
+    Backend rdbm{.be_type = "rdbm"};
     ldcf_schema schema;
     const ldcf_attrtype type = type_of(schema, "NAME 'a' " + definition, "", rdbm);
     const asyntaxinfo* info = type.info();
@@ -99,7 +99,7 @@ TEST(LdcfRdbmInfo, NamesTablesAndColumnsComeFromTheDefinition)
         {"NAME 'a' SYNTAX " ARC "24", "ACCESS-CLASS CRITICAL", "a 1|1|longowner.A|longowner.A|A:240|-|0|4"},
     };
     for (const auto& c : cases) {
-        Backend rdbm{"rdbm", nullptr, owner};
+        Backend rdbm{.be_type = "rdbm", .be_table_qualifier = owner};
         ldcf_schema schema;
         const ldcf_attrtype type = type_of(schema, c.definition, c.extended, rdbm);
         const asyntaxinfo* info = type.info();
@@ -152,7 +152,7 @@ TEST(LdcfRdbmInfo, SyntaxesAndRulesGiveTheCodesByWhichValuesAreCompared)
 
 TEST(LdcfRdbmInfo, ProtectionAndIndexesAreTakenOverAndTheBackEndMayAdd)
 {
-    Backend rdbm{"rdbm", nullptr, nullptr, nullptr, hang_on_two};
+    Backend rdbm{.be_type = "rdbm", .be_fill_attr_info = hang_on_two};
     ldcf_schema schema;
     const ldcf_attrtype type = type_of(
         schema, "NAME 'a' EQUALITY caseIgnoreMatch SYNTAX " ARC "15",
@@ -181,7 +181,7 @@ TEST(LdcfRdbmInfo, ATypeThatCannotBeStoredHasNoRecord)
         {"SYNTAX 9.9", "ldcf_rdbm::fill_ayntaxinfo: Invalid syntax: 9.9\n"},
     };
     for (const auto& [definition, told] : cases) {
-        Backend rdbm{"rdbm"};
+        Backend rdbm{.be_type = "rdbm"};
         ldcf_schema schema;
         schema.parse_str("ldapSyntaxes:( 9.9 )", "t");
         const ldcf_attrtype type = type_of(schema, std::string("NAME 'a' ") + definition, "", rdbm);
@@ -201,7 +201,7 @@ TEST(LdcfRdbmInfo, AClassRecordHoldsItsNamesAndItsOidInUpperCase)
 
 TEST(LdcfRdbmInfo, ACopyOfATypeMakesItsOwnRecordAndAChangedTypeANewOne)
 {
-    Backend rdbm{"rdbm"};
+    Backend rdbm{.be_type = "rdbm"};
     ldcf_schema schema;
     ldcf_attrtype type = type_of(schema, "NAME 'a' SYNTAX " ARC "15", "", rdbm);
     const asyntaxinfo* info = type.info();

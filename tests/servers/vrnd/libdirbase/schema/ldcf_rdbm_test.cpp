@@ -93,8 +93,8 @@ TEST(LdcfRdbm, ColumnNamesAreCutFoldedAndMadeAcceptable)
 
 TEST(LdcfRdbm, TableNamesAreCutFoldedAndQualified)
 {
-    Backend proxy{"proxy", nullptr, no_owner};
-    Backend rdbm{"RDBM", &proxy, owner, entries};
+    Backend proxy{.be_type = "proxy", .be_table_qualifier = no_owner};
+    Backend rdbm{.be_type = "RDBM", .be_next = &proxy, .be_table_qualifier = owner, .be_entry_table = entries};
     const back_ends list(&rdbm);
     EXPECT_EQ(table("a-bi", 5), "OWNER.A_BX");
     EXPECT_EQ(table("any", 4), "owner.entries");
@@ -123,7 +123,7 @@ TEST(LdcfRdbm, TableNamesAreCutFoldedAndQualified)
 
 TEST(LdcfRdbm, ATypesNamesComeFromItsDefinitionOrItsPrimaryName)
 {
-    Backend rdbm{"rdbm", nullptr, owner};
+    Backend rdbm{.be_type = "rdbm", .be_table_qualifier = owner};
     const back_ends list(&rdbm);
     const message_catcher log;
     const char* const cases[][3] = {

@@ -109,7 +109,7 @@ TEST(LdcfThreads, HandlesTakenByManyThreadsAreAllGivenBack)
 TEST(LdcfThreads, ARecordThatManyReadersAskForFirstIsMadeOnce)
 {
     load(*ldcf_schema_g);
-    Backend counting{"rdbm", nullptr, nullptr, nullptr, [](asyntaxinfo*) { ++records_made; }};
+    Backend counting{.be_type = "rdbm", .be_fill_attr_info = [](asyntaxinfo*) { ++records_made; }};
     g_backends = &counting;
     std::size_t types = 0;
     ldcf_for_each_definition(ldcf_schema_g->attribute_types, [&](const ldcf_attrtype&) { ++types; });

@@ -170,7 +170,7 @@ public:
     relational_store& operator=(const relational_store&) = delete;
 
 private:
-    Backend store_{"rdbm"};
+    Backend store_{.be_type = "rdbm"};
 };
 
 // The names of a set of handles, sorted, with blanks between.

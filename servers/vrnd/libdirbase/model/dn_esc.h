@@ -1,0 +1,233 @@
+// Structured DNs: one parse gives the chain of RDNs and both normal texts (RFC 4514 syntax, RFC 4517 section 4.2.15).
+//
+// The canonical text keeps the case of the values. In the upper text everything is in upper case that the schema compares
+// without regard to case; it is the key by which the whole server knows a DN. In both
+//
+//   - the pairs of an RDN are sorted by type, then by value, by vrn_strcasecmp; equal ones stay in the order of arrival;
+//   - a type is the schema's first name of the attribute, whatever name or OID was written;
+//   - a value is escaped in one way only: a backslash in front of each of " + , ; < = > \, of a "#" or space at its
+//     beginning and of a space at its end; a line feed or tab at either end as a hexadecimal pair, since it would get lost;
+//   - "+" joins pairs and "," RDNs, without blanks.
+//
+// So the canonical text normalises to itself. That is why a DN that ends in an empty value is refused however that is written
+// ("cn=," or a pair of quotes as well as "cn="), and one whose canonical text would end in it. A byte 0 written as a pair is refused because texts end there, and bytes
+// that aren't UTF-8 are refused in values that are folded to upper case.
+//
+// A record is built whole by one call and only read afterwards, by one thread or many; it owns its chain and its texts.
+// Nothing here raises an exception. Functions with a schema argument, and those that normalise, look types up in the active
+// schema: their caller holds the read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g).
+//
+// The environment variable VRND_V4_DN_PROCESSING, asked for once, turns on the older handling: "#" is then one of the
+// characters that have to be escaped everywhere in a value.
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "libraries/dirbase_export.h"
+
+struct asyntaxinfo;
+
+// What may be wrong with a DN.
+enum dn_error : int {
+    DN_ERR_EMPTY_VALUE = -1,  // empty value at the end of the text
+    DN_ERR_SYNTAX = 1,        // bad character in or behind a type, end of the text inside a type, malformed value
+    DN_ERR_ESCAPE = 2,        // backslash followed by what can't be escaped
+    DN_ERR_HEX_PAIR = 3,      // bad second digit of a hexadecimal pair
+    DN_ERR_HEX_STRING = 4,    // bad digit in a "#" value
+    DN_ERR_SPECIAL = 6,       // special character unescaped in a plain value
+    DN_ERR_OID = 7,           // a digit expected in a numeric OID
+    DN_ERR_STATE = 8,         // reserved: a machine in no state; none of them gives it
+    DN_ERR_AFTER_QUOTES = 9,  // junk behind the closing quote
+    DN_ERR_UNDEFINED = 10,    // attribute not defined in the schema
+    DN_ERR_UTF8 = 34,         // bytes that can't be folded to upper case
+    DN_ERR_TOO_LONG = 64,     // more than dn_longest bytes
+    DN_ERR_NO_MEMORY = 90,
+};
+
+// The longest DN that is parsed, in bytes; blanks in front of it count.
+constexpr std::size_t dn_longest = 2000;
+
+// How an RDN takes its pairs.
+constexpr int dn_order_given = 98;
+constexpr int dn_order_sorted = 99;
+
+// One pair of type and value.
+struct ldapRDN_struct33 {
+    char* type;
+    char* value;          // bare: quotes and escapes resolved, any byte but 0
+    std::int64_t syntax;  // syntax code (base/syntax_codes.h)
+
+    std::size_t type_length;
+    std::size_t value_length;
+    std::size_t escaped_length;  // of the value as the canonical text has it
+};
+
+// A pair in the chain of its RDN. This link, the record behind it and both texts are one block.
+struct ldapRDN_elem33 {
+    ldapRDN_struct33* rdn;
+    ldapRDN_elem33* next;
+};
+
+// One RDN.
+struct ldapDN_elem33 {
+    ldapRDN_elem33* pairs;
+    std::int64_t count;         // of pairs
+    std::uint64_t syntax_mask;  // the syntax codes of its attributes and-ed, from 1: 1 while all have SC_CIS, else 0
+    std::uint32_t encrypted;    // 1 when one of its attributes is stored encrypted
+    ldapDN_elem33* next;
+
+    ldapRDN_elem33* last;  // pair
+};
+
+// A parsed DN.
+struct ldap_escDN {
+    ldapDN_elem33* rdns;            // the most specific one first
+    std::int64_t count;             // of RDNs
+    std::int64_t length;            // of the input; of the canonical text once that is built
+    std::uint64_t all_case_ignore;  // bit 0: every attribute has SC_CIS
+    std::int64_t internal_error;    // 0 or one of dn_error
+    std::int32_t result;            // the LDAP result that getRC made of it
+    char* scratch;    // the cleaned DN: values as in the canonical text, types and order of pairs as written
+                      // (but numeric types, and those with "oid." in front, by their first names); in the
+                      // same block as the record. Empty in a record that no parse made.
+    char* canonical;  // heap texts
+    char* upper;
+
+    ldapDN_elem33* last;  // RDN
+};
+
+// The working text of a parse: parse_escRDN appends to it, and where a name from the schema needs more room it moves the
+// record, which only its maker may know by then, into a larger block.
+struct ldap_escDN_work {
+    ldap_escDN** dn;     // the record with the work area
+    std::size_t length;  // bytes written
+    std::size_t room;    // size of the work area
+};
+
+extern "C" {
+
+// ---- parsing ------------------------------------------------------------------------------------------------------
+
+// Parses a DN and builds its texts.
+//
+//   dn  zero-terminated UTF-8, at most dn_longest bytes; not changed, not kept. Empty or blank for the root.
+//
+// Returns a new record for the caller to release with free_ldap_escDN; null when dn is null or memory ran out. Its `result`
+// is LDAP_SUCCESS, LDAP_UNDEFINED_TYPE, LDAP_INVALID_DN_SYNTAX or LDAP_NO_MEMORY and is to be looked at first: after a
+// failed parse both texts are empty, for a DN that is too long they are null, and without memory any of them may be null.
+DIRBASE_EXPORT ldap_escDN* dn_normalize_esc(const char* dn);
+
+// The same without the schema: types stay as they are written, and the upper text is in upper case throughout.
+DIRBASE_EXPORT ldap_escDN* dn_normalize_light_esc(const char* dn);
+
+// The same without setting `result`.
+//
+//   order   dn_order_sorted, or dn_order_given for pairs in the order in which they are written
+//   schema  1 with the schema, 0 without
+DIRBASE_EXPORT ldap_escDN* parse_escDN(const char* dn, int order, int schema);
+
+// Parses the RDN at the beginning of a text.
+//
+//   text   not changed, not kept
+//   rdn    takes its pairs; after an error those in front of the fault
+//   work   takes the RDN's part of the working text, each pair with "+" behind it
+//   error  0 or one of dn_error
+//
+// Returns the position behind the RDN (a separator or the end of the text), or where the fault is. An attribute that the
+// schema doesn't know is told to the message log.
+DIRBASE_EXPORT const char* parse_escRDN(const char* text, ldapDN_elem33* rdn, ldap_escDN_work* work, int order,
+                                        int schema, int* error);
+
+// Find the type at *start, and the value behind the "=" at *start. *start moves to the element's first character and *last
+// to its last one, which stands in front of *start for an empty value. Return the position of the "=", or of the separator
+// or end behind the value; with *error not 0 the position of the fault, and *last is then not set.
+DIRBASE_EXPORT const char* find_end_attr_type33(const char** start, const char** last, int* error);
+DIRBASE_EXPORT const char* find_end_attr_value33(const char** start, const char** last, int* error);
+
+// Resolves a value, up to its end or the first separator outside quotes. Returns a new text for the caller to free(); null
+// with *error DN_ERR_SYNTAX for a malformed value and DN_ERR_NO_MEMORY without memory.
+DIRBASE_EXPORT char* normAttrValue(const char* value, int* error);
+
+// The schema's first name, the shortest, of an attribute by any name or OID, and its record; null for an unknown one. The
+// name belongs to the record.
+DIRBASE_EXPORT const char* FirstRDNType_and_syntax(const char* type, asyntaxinfo** info);
+
+// Whether a character of a value has to be escaped, and whether it may be: 1 or 0.
+DIRBASE_EXPORT int needsEscape(char c);
+DIRBASE_EXPORT int canEscape(char c);
+
+// Sets `result` from `internal_error` and returns it; LDAP_INVALID_DN_SYNTAX for a null record.
+DIRBASE_EXPORT int getRC(ldap_escDN* dn);
+
+// ---- the texts ----------------------------------------------------------------------------------------------------
+
+// Builds both texts of a record anew. With length 0 or an internal error both become empty. Returns the canonical text, which
+// stays the record's; null when memory ran out, with internal error DN_ERR_NO_MEMORY and no texts.
+DIRBASE_EXPORT char* BuildDNString33(ldap_escDN* dn);
+
+// Builds the upper text from the chain and the canonical text and returns it; it stays the record's. Bytes that can't be
+// folded give internal error DN_ERR_UTF8; the text is then not to be used. Null when memory ran out, with
+// DN_ERR_NO_MEMORY.
+DIRBASE_EXPORT char* dn_upcase_esc(ldap_escDN* dn);
+
+// Writes the pairs of one RDN as the upper text has them, "+" between them, and a terminator. *out has room for as many bytes
+// as the canonical text of the RDN has, and for the terminator, to which it moves.
+DIRBASE_EXPORT void dn_upcaseRDN(const ldapRDN_elem33* pairs, char** out);
+
+// The texts of a record, which stay its own; null for a null record.
+DIRBASE_EXPORT const char* GetDNString33(const ldap_escDN* dn);
+DIRBASE_EXPORT const char* GetDNUpper33(const ldap_escDN* dn);
+
+// ---- comparison and parents -----------------------------------------------------------------------------------------
+
+// Return 1 when both are equal, else 0: as many RDNs, as many pairs, types equal without regard to case, and values, each
+// resolved once more by normAttrValue, too. A value that has no such form, or of which only the part in front of a separator
+// would count, is taken as it is. Without memory they are all taken as they are.
+DIRBASE_EXPORT int compare_ldap_escDN(const ldap_escDN* a, const ldap_escDN* b);
+DIRBASE_EXPORT int compare_ldapDN_elem33(const ldapDN_elem33* a, const ldapDN_elem33* b);
+DIRBASE_EXPORT int compare_ldapRDN33(const ldapRDN_struct33* a, const ldapRDN_struct33* b);
+
+// A new record of all RDNs but the first, with the error and result of the given one, for the caller to release with
+// free_ldap_escDN. Null for a null record or fewer than two RDNs, and without memory.
+DIRBASE_EXPORT ldap_escDN* ParentDN33(const ldap_escDN* dn);
+
+// A new text of all RDNs but the first with bare values, every RDN followed by ",", for the caller to free(): for people to
+// read, since values with separators can't be told apart in it. Null for a null record or fewer than two RDNs, and without
+// memory.
+DIRBASE_EXPORT char* getParentDn(const ldap_escDN* dn);
+
+// A new upper text of all RDNs but the first, normalised by the active schema under the read side of the schema lock, which
+// this function takes itself. Null as above, and when the schema no longer takes the DN.
+DIRBASE_EXPORT char* getParentDnUpper(const ldap_escDN* dn);
+
+// Replaces a DN by a copy of its upper text, where that differs.
+//
+//   dn       the place of a text
+//   release  not 0: the replaced text is given to free()
+//
+// Returns LDAP_SUCCESS; LDAP_NO_MEMORY, or the result of the failed normalisation, and the text stays.
+DIRBASE_EXPORT int replace_DN(char** dn, int release);
+
+// ---- records and their chains ---------------------------------------------------------------------------------------
+
+// New records for their free_ functions; null without memory. A record of a DN comes with a work area of `work` bytes, 1 at
+// least.
+DIRBASE_EXPORT ldap_escDN* new_ldap_escDN(std::size_t work);
+DIRBASE_EXPORT ldapDN_elem33* new_ldapDN_elem33(void);
+DIRBASE_EXPORT ldapRDN_elem33* new_ldapRDN_elem33(const char* type, const char* value, std::int64_t syntax);
+
+// Release a record and all below it, not what is linked behind it. A null pointer, or a pointer to null, does nothing.
+DIRBASE_EXPORT void free_ldap_escDN(ldap_escDN** dn);  // sets *dn to null
+DIRBASE_EXPORT void free_ldapDN_elem33(ldapDN_elem33* rdn);
+DIRBASE_EXPORT void free_ldapRDN_elem33(ldapRDN_elem33* pair);
+
+// Put a pair into an RDN, by its order with dn_order_sorted and else at the end, and an RDN at the end of a DN. Both are
+// counted and owned by what takes them.
+DIRBASE_EXPORT void insert_ldapRDN_elem33(ldapDN_elem33* rdn, ldapRDN_elem33* pair, int order);
+DIRBASE_EXPORT void insert_ldapDN_elem33(ldap_escDN* dn, ldapDN_elem33* rdn);
+
+// A deep copy of one RDN; null without memory.
+DIRBASE_EXPORT ldapDN_elem33* copy_ldapDN_elem33(const ldapDN_elem33* rdn);
+
+}  // extern "C"
