@@ -1,5 +1,6 @@
 #!/bin/sh
-# Shows the main job on the schema that ships: load it, explain it, change it, and see what a change may not do.
+# Shows the main job on the schema that ships: load it, explain it, change it, see what a change may not do, and put names
+# into their normal form by it.
 #
 #   tools/demo.sh DIRBASE     DIRBASE is the path of the tool
 #
@@ -90,3 +91,16 @@ run_refused schema modify --schema schema delete badge.at
 
 heading 'And the schema still loads, with one attribute type and one class more'
 run schema check --schema schema
+
+heading 'One DN in five spellings, and one that is refused'
+cat >names <<'END'
+cn=Bob Smith,o=Acme\, Inc.,c=us
+CN = Bob Smith , O="Acme, Inc." ; C=us
+commonName=Bob Smith, organizationName=Acme\2C Inc., countryName=us
+2.5.4.3=Bob Smith,oid.2.5.4.10=Acme\, Inc.,2.5.4.6=us
+cn=#0409426F6220536D697468,o=Acme\2c Inc.,c=us
+cn=Bob Smith,o=Acme, Inc.,c=us
+END
+cat names
+echo
+run_refused dn normalize --schema schema - <names
