@@ -1,5 +1,5 @@
-// Counts this thread's allocations. The program's malloc and its kin count and pass the call on to the C library; operator
-// new and the C library's own functions (strdup) end up there too.
+// Counts this thread's allocations. The program's malloc and its kin count and pass the call on to the C library;
+// operator new and the C library's own functions (strdup) end up there too.
 #pragma once
 
 #include <cstddef>

@@ -47,10 +47,11 @@ void fetch_children(const avl_node* node)
     __builtin_prefetch(node->right);
 }
 
-// ---- rotations --------------------------------------------------------------------------------------------------------
+// ---- rotations
+// --------------------------------------------------------------------------------------------------------
 
-// Brings the child on the side `up` into the place of its parent: a right rotation brings the left child up. Balances are
-// the caller's to set. False, with a message, when there is no such child.
+// Brings the child on the side `up` into the place of its parent: a right rotation brings the left child up. Balances
+// are the caller's to set. False, with a message, when there is no such child.
 bool rotate(avl_node** link, side_t up)
 {
     avl_node* node = *link;
@@ -91,7 +92,8 @@ bool rotate_twice(avl_node** link, side_t high)
     return rotate(link, high);
 }
 
-// ---- insert -----------------------------------------------------------------------------------------------------------
+// ---- insert
+// -----------------------------------------------------------------------------------------------------------
 
 avl_node* new_node(void* data)
 {
@@ -101,8 +103,8 @@ avl_node* new_node(void* data)
     return node;
 }
 
-// Sets balances right after `leaf` was hung in. `way` are the turns from *top to the leaf; the nodes between the two were
-// even and lean towards the leaf now. False when the tree is damaged at *top, with nothing changed.
+// Sets balances right after `leaf` was hung in. `way` are the turns from *top to the leaf; the nodes between the two
+// were even and lean towards the leaf now. False when the tree is damaged at *top, with nothing changed.
 bool rebalance_grown(avl_node** top, const side_t* way, const avl_node* leaf)
 {
     avl_node* node = *top;
@@ -122,7 +124,8 @@ bool rebalance_grown(avl_node** top, const side_t* way, const avl_node* leaf)
     return below->balance == grown ? rotate_once(top, grown) : rotate_twice(top, grown);
 }
 
-// ---- delete -----------------------------------------------------------------------------------------------------------
+// ---- delete
+// -----------------------------------------------------------------------------------------------------------
 
 // Sets the balance of *link right after its subtree on `side` has shrunk, and says whether the whole has shrunk.
 bool rebalance_shrunk(avl_node** link, side_t side)
@@ -148,7 +151,8 @@ bool rebalance_shrunk(avl_node** link, side_t side)
     return false;
 }
 
-// ---- traversals -------------------------------------------------------------------------------------------------------
+// ---- traversals
+// -------------------------------------------------------------------------------------------------------
 
 // Visits the node before, between or after its subtrees, and says whether the visitor stopped: ends are told apart by
 // that and not by the result, so that a stopflag of AVL_NOMORE stops where any other would.
@@ -180,7 +184,8 @@ avl_node* find_lin(avl_node* node, const void* data, avl_cmp cmp)
     return nullptr;
 }
 
-// ---- the walk without callback ----------------------------------------------------------------------------------------
+// ---- the walk without callback
+// ----------------------------------------------------------------------------------------
 
 constexpr std::size_t avl_list_step = 100;
 
@@ -215,7 +220,8 @@ int collect(void* data, void* /*arg*/)
 
 }  // namespace
 
-// ---- the functions ----------------------------------------------------------------------------------------------------
+// ---- the functions
+// ----------------------------------------------------------------------------------------------------
 
 extern "C" {
 

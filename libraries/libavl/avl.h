@@ -70,14 +70,14 @@ DIRBASE_EXPORT void* avl_delete(avl_node** root, const void* data, avl_cmp cmp);
 // Returns the stored object that compares equal to `data`, or null.
 DIRBASE_EXPORT void* avl_find(avl_node* root, const void* data, avl_cmp cmp);
 
-// The same for a comparison that doesn't follow the tree's order: looks at every node, then at its left subtree, then at
-// its right one, and returns the first object for which `cmp` gives 0.
+// The same for a comparison that doesn't follow the tree's order: looks at every node, then at its left subtree, then
+// at its right one, and returns the first object for which `cmp` gives 0.
 DIRBASE_EXPORT void* avl_find_lin(avl_node* root, const void* data, avl_cmp cmp);
 
 // Calls fn(data, arg) for each object in the order `type`, one of avl_order, until it gives `stopflag`.
 //
-// Returns `stopflag` after a stop and -6 at the end of the tree, so a stopflag of -6 tells nothing; or -1, with a line on
-// standard error, for a `type` that is no order.
+// Returns `stopflag` after a stop and -6 at the end of the tree, so a stopflag of -6 tells nothing; or -1, with a line
+// on standard error, for a `type` that is no order.
 DIRBASE_EXPORT int avl_apply(avl_node* root, avl_fn fn, void* arg, int stopflag, int type);
 
 // Calls fmatch(stored, marg) for each object that matches a key, by descending only where such objects can be.
@@ -86,7 +86,8 @@ DIRBASE_EXPORT int avl_apply(avl_node* root, avl_fn fn, void* arg, int stopflag,
 //         to the right, of the stored object.
 //
 // A match is visited before those in its left subtree, and these before those in its right one. Returns `stopflag` as
-// soon as fmatch gives it, else -6. A stopflag of -6 isn't to be used: the end of a left subtree stops the walk as well.
+// soon as fmatch gives it, else -6. A stopflag of -6 isn't to be used: the end of a left subtree stops the walk as
+// well.
 DIRBASE_EXPORT int avl_prefixapply(avl_node* root, void* data, avl_fn fmatch, void* marg, avl_cmp fcmp, int carg,
                                    int stopflag);
 

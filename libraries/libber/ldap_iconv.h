@@ -20,22 +20,22 @@ extern "C" {
 
 // Makes the conversion from the character set `from` to the character set `to`, by the names that iconv_open knows.
 //
-// Returns a new record for the caller to close with ldap_iconv_close, also when the conversion isn't available: then its
-// descriptor is (iconv_t)-1 and errno tells why (EINVAL: not known; ENOMEM; and so on). Null with ENOMEM when there is no
-// memory for the record.
+// Returns a new record for the caller to close with ldap_iconv_close, also when the conversion isn't available: then
+// its descriptor is (iconv_t)-1 and errno tells why (EINVAL: not known; ENOMEM; and so on). Null with ENOMEM when there
+// is no memory for the record.
 DIRBASE_EXPORT ldap_iconv_t* ldap_iconv_open(const char* to, const char* from);
 
 // Converts as much as it can, and moves the positions and the counts of bytes left on behind what was read and written.
 // With a null `in`, or a null position in it, the conversion is set to the start of a text.
 //
-// Returns the number of characters for which the target has only a substitute, 0 in general, or -1 with errno: EILSEQ for
-// input that is no text or that the target lacks, EINVAL for input that ends within a character, E2BIG for output without
-// room, EBADF without a conversion. All of these leave the positions at the place in question.
+// Returns the number of characters for which the target has only a substitute, 0 in general, or -1 with errno: EILSEQ
+// for input that is no text or that the target lacks, EINVAL for input that ends within a character, E2BIG for output
+// without room, EBADF without a conversion. All of these leave the positions at the place in question.
 DIRBASE_EXPORT int ldap_iconv(ldap_iconv_t* conversion, char** in, std::size_t* in_left, char** out,
                               std::size_t* out_left);
 
-// Closes a conversion, or does nothing for null. Returns 0, or -1 with errno when the platform refuses; the record is gone
-// either way.
+// Closes a conversion, or does nothing for null. Returns 0, or -1 with errno when the platform refuses; the record is
+// gone either way.
 DIRBASE_EXPORT int ldap_iconv_close(ldap_iconv_t* conversion);
 
 // Returns an item of the current locale's language information: a text of the platform's that lives until the next

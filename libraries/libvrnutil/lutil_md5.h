@@ -1,4 +1,5 @@
-// MD5 (RFC 1321), by the platform's digest library. It tells texts apart and serves for identifiers; it protects nothing.
+// MD5 (RFC 1321), by the platform's digest library. It tells texts apart and serves for identifiers; it protects
+// nothing.
 #pragma once
 
 #include <cstddef>

@@ -49,7 +49,8 @@ void released(const void* block)
 
 }  // namespace
 
-// ---- malloc and its kin -----------------------------------------------------------------------------------------------
+// ---- malloc and its kin
+// -----------------------------------------------------------------------------------------------
 
 #ifdef REPLACE_MALLOC
 
@@ -146,7 +147,8 @@ void system_free(void* block)
 
 #endif
 
-// ---- operator new and delete ------------------------------------------------------------------------------------------
+// ---- operator new and delete
+// ------------------------------------------------------------------------------------------
 
 namespace {
 
@@ -205,7 +207,8 @@ void operator delete(void* p, align, no_throw) noexcept { delete_block(p); }
 void operator delete[](void* p, align, no_throw) noexcept { delete_block(p); }
 // clang-format on
 
-// ---- the runs ---------------------------------------------------------------------------------------------------------
+// ---- the runs
+// ---------------------------------------------------------------------------------------------------------
 
 namespace test_support {
 

@@ -17,8 +17,8 @@ int ask_of_dns(const common_options& common, dn_question question, const std::ve
 // Tells whether two DNs are the same.
 int compare_dns(const common_options& common, const std::string& first, const std::string& second, bool light);
 
-// Prints the normal form of values of one syntax: the OID of a syntax, or the name of an attribute type whose values are
-// meant.
+// Prints the normal form of values of one syntax: the OID of a syntax, or the name of an attribute type whose values
+// are meant.
 int normalize_values(const common_options& common, const std::string& syntax, const std::vector<std::string>& values);
 
 // "34 invalidDNSyntax", for the results that the data model gives (RFC 4511, appendix A).

@@ -211,9 +211,8 @@ void add_diff(CLI::App& group, options& given, command& chosen)
                                      given.common);
     app->add_option("BEFORE", given.before, "The directory to compare with")->type_name("")->required();
     app->add_option("AFTER", given.after, "The directory that may differ")->type_name("")->required();
-    app->callback([&] {
-        chosen = [&](message_collector&) { return diff_schemas(given.common, given.before, given.after); };
-    });
+    app->callback(
+        [&] { chosen = [&](message_collector&) { return diff_schemas(given.common, given.before, given.after); }; });
 }
 
 void add_modify(CLI::App& group, options& given, command& chosen)

@@ -14,20 +14,13 @@ struct property {
 };
 
 constexpr property properties[] = {
-    {"langtag", ldcf_api_get_langtag_attrs},
-    {"nonlangtag", ldcf_api_get_nonlangtag_attrs},
-    {"unique", ldcf_api_get_unique_attrs},
-    {"nonunique", ldcf_api_get_nonunique_attrs},
-    {"attrcache", ldcf_api_get_attrcache_attrs},
-    {"nonattrcache", ldcf_api_get_nonattrcache_attrs},
-    {"config", ldcf_api_get_config_attrs},
-    {"nonconfig", ldcf_api_get_nonconfig_attrs},
-    {"operational", ldcf_api_get_operational_attrs},
-    {"nonoperational", ldcf_api_get_nonoperational_attrs},
-    {"encryptable", ldcf_api_get_encryptable_attrs},
-    {"nonencryptable", ldcf_api_get_nonencryptable_attrs},
-    {"encrypted", ldcf_api_get_encrypted_attrs},
-    {"nonencrypted", ldcf_api_get_nonencrypted_attrs},
+    {"langtag", ldcf_api_get_langtag_attrs},         {"nonlangtag", ldcf_api_get_nonlangtag_attrs},
+    {"unique", ldcf_api_get_unique_attrs},           {"nonunique", ldcf_api_get_nonunique_attrs},
+    {"attrcache", ldcf_api_get_attrcache_attrs},     {"nonattrcache", ldcf_api_get_nonattrcache_attrs},
+    {"config", ldcf_api_get_config_attrs},           {"nonconfig", ldcf_api_get_nonconfig_attrs},
+    {"operational", ldcf_api_get_operational_attrs}, {"nonoperational", ldcf_api_get_nonoperational_attrs},
+    {"encryptable", ldcf_api_get_encryptable_attrs}, {"nonencryptable", ldcf_api_get_nonencryptable_attrs},
+    {"encrypted", ldcf_api_get_encrypted_attrs},     {"nonencrypted", ldcf_api_get_nonencrypted_attrs},
 };
 
 std::vector<std::string> names_in(char** array)

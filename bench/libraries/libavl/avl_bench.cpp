@@ -1,8 +1,8 @@
 // The tree beside std::set of pointers with the same comparison, called through the same pointer.
 //
-// Both do the same work on the same objects within each iteration, so what disturbs one disturbs the other. An iteration
-// treats all n objects in random order. The time is the tree's; `ratio` is the tree's time over the set's, and `goal` what
-// it may be.
+// Both do the same work on the same objects within each iteration, so what disturbs one disturbs the other. An
+// iteration treats all n objects in random order. The time is the tree's; `ratio` is the tree's time over the set's,
+// and `goal` what it may be.
 #include <benchmark/benchmark.h>
 
 #include <algorithm>

@@ -1,4 +1,5 @@
-// The tree beside std::set, and beside a slow and obvious balanced tree that measures heights instead of keeping balances.
+// The tree beside std::set, and beside a slow and obvious balanced tree that measures heights instead of keeping
+// balances.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -39,7 +40,8 @@ int key_of(const void* data)
     return static_cast<const object*>(data)->key;
 }
 
-// ---- the slow tree ----------------------------------------------------------------------------------------------------
+// ---- the slow tree
+// ----------------------------------------------------------------------------------------------------
 
 struct slow_node {
     int key;
@@ -134,7 +136,8 @@ std::string shape(const avl_node* tree)
            shape(tree->right) + ")";
 }
 
-// ---- the fixture ------------------------------------------------------------------------------------------------------
+// ---- the fixture
+// ------------------------------------------------------------------------------------------------------
 
 int keep_data(void* data, void* arg)
 {
@@ -184,7 +187,8 @@ protected:
     avl_node* root = nullptr;
 };
 
-// ---- insert, find, delete ---------------------------------------------------------------------------------------------
+// ---- insert, find, delete
+// ---------------------------------------------------------------------------------------------
 
 TEST_F(AvlTree, RandomInsertsAndDeletesKeepShapeBalancesAndObjects)
 {
@@ -303,7 +307,8 @@ TEST(AvlDamagedTree, AMissingChildIsReportedAndNothingMoves)
     }
 }
 
-// ---- scans and traversals ---------------------------------------------------------------------------------------------
+// ---- scans and traversals
+// ---------------------------------------------------------------------------------------------
 
 TEST_F(AvlTree, TheScanMeetsNodesBeforeTheirSubtreesAndLeftBeforeRight)
 {
@@ -417,7 +422,8 @@ TEST_F(AvlTree, FreeingHandsOverEachObjectChildrenFirst)
     EXPECT_EQ(avl_free(nullptr, [](void*) { std::abort(); }), 0);
 }
 
-// ---- the walk without callback ----------------------------------------------------------------------------------------
+// ---- the walk without callback
+// ----------------------------------------------------------------------------------------
 
 TEST_F(AvlTree, AWalkHandsOutEveryObjectInOrderAndThenNull)
 {

@@ -23,8 +23,17 @@ using words = std::vector<std::string>;
 TEST(ToolCall, HelpAndVersionAreEverywhere)
 {
     const words calls[] = {
-        {}, {"schema"}, {"schema", "check"}, {"schema", "print"}, {"schema", "show"}, {"schema", "modify"},
-        {"schema", "list"}, {"schema", "diff"}, {"dn"}, {"dn", "normalize"}, {"dn", "compare"},
+        {},
+        {"schema"},
+        {"schema", "check"},
+        {"schema", "print"},
+        {"schema", "show"},
+        {"schema", "modify"},
+        {"schema", "list"},
+        {"schema", "diff"},
+        {"dn"},
+        {"dn", "normalize"},
+        {"dn", "compare"},
     };
     for (words call : calls) {
         SCOPED_TRACE(testing::PrintToString(call));

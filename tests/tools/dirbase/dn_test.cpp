@@ -17,20 +17,27 @@ TEST(ToolDn, EachDnHasItsAnswer)
         int status;
         const char* out;
     } cases[] = {
-        {{"normalize", "CN = Bob , O=\"A, B\" ; c=us"}, 0, "canonical  cn=Bob,o=A\\, B,c=us\nupper      CN=BOB,O=A\\, B,C=US\n"},
+        {{"normalize", "CN = Bob , O=\"A, B\" ; c=us"},
+         0,
+         "canonical  cn=Bob,o=A\\, B,c=us\nupper      CN=BOB,O=A\\, B,C=US\n"},
         {{"normalize", "--light", "foo=b+BAR=a"}, 0, "canonical  BAR=a+foo=b\nupper      BAR=A+FOO=B\n"},
         {{"normalize", ""}, 0, "canonical  \nupper      \n"},
-        {{"normalize", "cn=a,foo=b", "sn=c"}, 1,
+        {{"normalize", "cn=a,foo=b", "sn=c"},
+         1,
          "refused    17 undefinedAttributeType at byte 5: the schema has no such attribute type\n"
          "canonical  sn=c\nupper      SN=C\n"},
-        {{"normalize", "sn=b,cn=a=b"}, 1, "refused    34 invalidDNSyntax at byte 9: this character has to be escaped\n"},
+        {{"normalize", "sn=b,cn=a=b"},
+         1,
+         "refused    34 invalidDNSyntax at byte 9: this character has to be escaped\n"},
         {{"normalize", "cn=\xff"}, 1, "refused    34 invalidDNSyntax: a value isn't UTF-8\n"},
         {{"normalize", "cn=" + std::string(1998, 'x')}, 1, "refused    34 invalidDNSyntax: longer than 2000 bytes\n"},
         {{"check", "cn=a+sn=b,o=x", "cn=a,"}, 1, "ok\nrefused    34 invalidDNSyntax at byte 5\n"},
         {{"parent", "cn=a, O=b ,c=us", "c=us", ""}, 0, "o=b,c=us\nnone\nnone\n"},
         {{"compare", "cn=a,o=b", "commonName=A , 2.5.4.10=B"}, 0, "same\n"},
         {{"compare", "cn=a", "sn=a"}, 1, "different\n"},
-        {{"compare", "cn=a", "cn"}, 1, "refused    34 invalidDNSyntax at byte 2: no attribute type, \"=\" or proper value here\n"},
+        {{"compare", "cn=a", "cn"},
+         1,
+         "refused    34 invalidDNSyntax at byte 2: no attribute type, \"=\" or proper value here\n"},
         {{"compare", "cn=a"}, 2, ""},
     };
     for (const auto& c : cases) {

@@ -50,26 +50,28 @@ TEST(SchemaDiff, TellsWhatIsNewGoneAndChangedAndWhatThatMeansForClasses)
                         "objectClasses { ( 1.2.10 NAME 'base' SUP top ABSTRACT MUST here MAY cn )\n"
                         "  ( 1.2.11 NAME 'derived' SUP base ) ( 1.2.12 NAME 'leaf' SUP derived ) }");
     const schema_copy after;
-    after.write_schema("V3.additions",
-                       "attributeTypes { ( 1.2.2 NAME 'both' SUP name SINGLE-VALUE ) ( 1.2.3 NAME 'there' SUP name ) }\n"
-                       "XANattributeTypes:( both LENGTH 7 )\n"
-                       "objectClasses { ( 1.2.10 NAME 'base' SUP top AUXILIARY MUST ( cn $ there ) )\n"
-                       "  ( 1.2.11 NAME 'derived' SUP top ) ( 1.2.12 NAME 'leaf' SUP derived ) }");
+    after.write_schema(
+        "V3.additions",
+        "attributeTypes { ( 1.2.2 NAME 'both' SUP name SINGLE-VALUE ) ( 1.2.3 NAME 'there' SUP name ) }\n"
+        "XANattributeTypes:( both LENGTH 7 )\n"
+        "objectClasses { ( 1.2.10 NAME 'base' SUP top AUXILIARY MUST ( cn $ there ) )\n"
+        "  ( 1.2.11 NAME 'derived' SUP top ) ( 1.2.12 NAME 'leaf' SUP derived ) }");
     const tool_run run = run_tool({"schema", "diff", before.folder(), after.folder()});
     EXPECT_EQ(run.status, 1) << run.err;
-    EXPECT_THAT(lines_of(run.out), ElementsAre(
-        "attribute type here: gone", "  - ( 1.2.1 NAME 'here' SUP name )",
-        "attribute type both: changed", "  - ( 1.2.2 NAME 'both' SUP name )",
-        "  + ( 1.2.2 NAME 'both' SUP name SINGLE-VALUE )", "  + ( 1.2.2 LENGTH 7 )",
-        "attribute type there: new", "  + ( 1.2.3 NAME 'there' SUP name )",
-        "object class base: changed", "  - ( 1.2.10 NAME 'base' SUP top ABSTRACT MUST here MAY cn )",
-        "  + ( 1.2.10 NAME 'base' SUP top AUXILIARY MUST ( cn $ there ) )", "  kind: ABSTRACT to AUXILIARY",
-        "  no longer MUST: here", "  newly MUST: there", "  from MAY to MUST: cn",
-        "object class derived: changed", "  - ( 1.2.11 NAME 'derived' SUP base STRUCTURAL )",
-        "  + ( 1.2.11 NAME 'derived' SUP top STRUCTURAL )", "  superiors: base, top to top",
-        "object class leaf: changed", "  superiors: base, derived, top to derived, top"));
+    EXPECT_THAT(
+        lines_of(run.out),
+        ElementsAre("attribute type here: gone", "  - ( 1.2.1 NAME 'here' SUP name )", "attribute type both: changed",
+                    "  - ( 1.2.2 NAME 'both' SUP name )", "  + ( 1.2.2 NAME 'both' SUP name SINGLE-VALUE )",
+                    "  + ( 1.2.2 LENGTH 7 )", "attribute type there: new", "  + ( 1.2.3 NAME 'there' SUP name )",
+                    "object class base: changed", "  - ( 1.2.10 NAME 'base' SUP top ABSTRACT MUST here MAY cn )",
+                    "  + ( 1.2.10 NAME 'base' SUP top AUXILIARY MUST ( cn $ there ) )", "  kind: ABSTRACT to AUXILIARY",
+                    "  no longer MUST: here", "  newly MUST: there", "  from MAY to MUST: cn",
+                    "object class derived: changed", "  - ( 1.2.11 NAME 'derived' SUP base STRUCTURAL )",
+                    "  + ( 1.2.11 NAME 'derived' SUP top STRUCTURAL )", "  superiors: base, top to top",
+                    "object class leaf: changed", "  superiors: base, derived, top to derived, top"));
 
-    const auto shown = nlohmann::json::parse(run_tool({"schema", "diff", "--json", before.folder(), after.folder()}).out);
+    const auto shown =
+        nlohmann::json::parse(run_tool({"schema", "diff", "--json", before.folder(), after.folder()}).out);
     EXPECT_EQ(shown["ok"], false);
     EXPECT_EQ(shown["differences"][3]["classKind"]["after"], "AUXILIARY");
     EXPECT_EQ(shown["differences"][3]["attributes"].size(), 3u);

@@ -18,9 +18,9 @@ struct Backend {
     const char* (*be_table_qualifier)(Backend* be) = nullptr;
     const char* (*be_entry_table)(Backend* be) = nullptr;
 
-    // May add to the record of an attribute type that has just been made, before anybody else sees it. It may run in any
-    // look-up, while other threads wait to make theirs: it takes no lock that callers of look-ups hold, asks for no record
-    // of the same type, and raises nothing. What it hangs on back_end_list is given to free() with the record.
+    // May add to the record of an attribute type that has just been made, before anybody else sees it. It may run in
+    // any look-up, while other threads wait to make theirs: it takes no lock that callers of look-ups hold, asks for no
+    // record of the same type, and raises nothing. What it hangs on back_end_list is given to free() with the record.
     void (*be_fill_attr_info)(asyntaxinfo* info) = nullptr;
 };
 

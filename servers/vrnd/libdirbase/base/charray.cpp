@@ -34,8 +34,8 @@ void report_no_memory(const char* function, const char* call)
     debug_error("Error - %s: %s failed. Out of memory\n", function, call);
 }
 
-// Makes *array at least `slots` long, the terminator's slot included, for a function of that name. False when memory ran
-// out. A null array becomes one whose slots are still to be set, all of them.
+// Makes *array at least `slots` long, the terminator's slot included, for a function of that name. False when memory
+// ran out. A null array becomes one whose slots are still to be set, all of them.
 bool make_room(char*** array, std::size_t slots, const char* function)
 {
     auto* grown = static_cast<char**>(std::realloc(*array, slots * sizeof(char*)));

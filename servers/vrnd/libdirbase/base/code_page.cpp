@@ -116,7 +116,7 @@ int translate(ldap_iconv_t* conversion, const char* input, char** output, std::s
     }
 
     progress state = {const_cast<char*>(input), input_size, translated.get(),
-                     output_size};  // iconv only reads the input
+                      output_size};  // iconv only reads the input
     const int rc = convert(conversion, state);
     if (rc == -1 || state.in_left != 0) {
         report(rc);

@@ -30,8 +30,8 @@ DIRBASE_EXPORT void set_cfg_xlate_on(void);
 
 // Finds the local code page and opens both conversions; nothing is done once local_codepage is set.
 //
-// Returns 0, or -1 after logging the reason when the platform doesn't tell the code page or offers no conversion for it.
-// local_codepage stays null then, so that the next call tries again.
+// Returns 0, or -1 after logging the reason when the platform doesn't tell the code page or offers no conversion for
+// it. local_codepage stays null then, so that the next call tries again.
 DIRBASE_EXPORT int initIconvHandle(void);
 
 // Reads a line of a configuration file, as it stands there: nothing is translated.
@@ -39,8 +39,8 @@ DIRBASE_EXPORT int initIconvHandle(void);
 //   buffer  at least 1024 bytes; takes the line with its line feed and a terminator. A longer line comes in pieces.
 //   file    open for reading.
 //
-// Returns 0, or -1 at the end of the file or when it can't be read. While cfg_xlate is on, the first call makes sure that
-// the conversion to UTF-8 can be had: -1 after logging the reason when it can't, with nothing read.
+// Returns 0, or -1 at the end of the file or when it can't be read. While cfg_xlate is on, the first call makes sure
+// that the conversion to UTF-8 can be had: -1 after logging the reason when it can't, with nothing read.
 DIRBASE_EXPORT int getline_and_xlate(char* buffer, std::FILE* file);
 
 // Translate a zero-terminated text, terminator included. initIconvHandle comes first.
@@ -49,13 +49,13 @@ DIRBASE_EXPORT int getline_and_xlate(char* buffer, std::FILE* file);
 //   output  takes a new text for the caller to free(), or null when there is none.
 //   length  takes the number of bytes of the new text, its terminator included, or 0 when there is none.
 //
-// Return 0; 90 (no memory); or -1 after logging it, when the input is not a text of its code page, holds a character that
-// the other one lacks, or grows to more than three times its size.
+// Return 0; 90 (no memory); or -1 after logging it, when the input is not a text of its code page, holds a character
+// that the other one lacks, or grows to more than three times its size.
 DIRBASE_EXPORT int xlate_localcp_to_utf8(const char* input, char** output, std::size_t* length);
 DIRBASE_EXPORT int xlate_utf8_to_localcp(const char* input, char** output, std::size_t* length);
 
-// Closes the conversion to UTF-8 and forgets the local code page, so that the next initIconvHandle opens both conversions
-// afresh. The conversion to the local code page goes on working until that call, which closes it.
+// Closes the conversion to UTF-8 and forgets the local code page, so that the next initIconvHandle opens both
+// conversions afresh. The conversion to the local code page goes on working until that call, which closes it.
 DIRBASE_EXPORT void free_iconv_handle(void);
 
 }  // extern "C"

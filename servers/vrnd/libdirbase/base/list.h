@@ -1,7 +1,8 @@
-// A doubly linked list of pointers with a mutex of its own and, when asked for, a condition to wait for its first entry.
+// A doubly linked list of pointers with a mutex of its own and, when asked for, a condition to wait for its first
+// entry.
 //
-// Only `add` locks. Everything else needs the caller to hold the mutex, or to be alone on the list. The list offers no way
-// to wait or to take entries off; consumers do that on its members:
+// Only `add` locks. Everything else needs the caller to hold the mutex, or to be alone on the list. The list offers no
+// way to wait or to take entries off; consumers do that on its members:
 //
 //     pthread_mutex_lock(list.getMutex());
 //     while (list.head == nullptr)
@@ -10,8 +11,8 @@
 //     list.head = list.tail = nullptr;
 //     pthread_mutex_unlock(list.getMutex());
 //
-// The condition tells of the step from no entry to one and of nothing else, so a waiter empties the list before it waits
-// again.
+// The condition tells of the step from no entry to one and of nothing else, so a waiter empties the list before it
+// waits again.
 #pragma once
 
 #include <new>
@@ -64,8 +65,8 @@ public:
     List(const List&) = delete;
     List& operator=(const List&) = delete;
 
-    // Makes the list empty and its mutex, attributes and condition new. The constructor has done that: a call on a list in
-    // use leaks its entries and breaks its mutex.
+    // Makes the list empty and its mutex, attributes and condition new. The constructor has done that: a call on a list
+    // in use leaks its entries and breaks its mutex.
     void init()
     {
         head = nullptr;

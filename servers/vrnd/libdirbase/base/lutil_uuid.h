@@ -1,12 +1,12 @@
 // Random bytes for identifiers, and the identifiers that the server stamps on entries.
 //
 // An identifier has the form of a time-based UUID (RFC 4122, version 1) and is unique for its purpose, though not built
-// letter by letter as the RFC has it: its time is in whole seconds, its clock sequence steps with every identifier, and its
-// node address is random with the top bit of the first byte set. The sequence shows in 13 bits, so a process can make 8192
-// identifiers in a second before one comes again.
+// letter by letter as the RFC has it: its time is in whole seconds, its clock sequence steps with every identifier, and
+// its node address is random with the top bit of the first byte set. The sequence shows in 13 bits, so a process can
+// make 8192 identifiers in a second before one comes again.
 //
-// A process that forks gives its child the node address and the sequence that it has: the child must not make identifiers
-// unless it runs another program first.
+// A process that forks gives its child the node address and the sequence that it has: the child must not make
+// identifiers unless it runs another program first.
 //
 // Every function may be called from any thread at any time.
 #pragma once

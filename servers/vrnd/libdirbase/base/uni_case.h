@@ -1,12 +1,14 @@
 // Upper and lower case of the 16-bit range of Unicode, by constant tables and without a library.
 //
-// Directory text is stored and compared in the case that these tables give, so they are fixed: they hold the simple case
-// mappings of the Unicode Character Database as far as the first servers knew them, not those of the newest version. Two
-// properties are kept on purpose. A mapping never changes the number of bytes of a character's UTF-8 form (RFC 3629), so
-// text can be folded in place; and the mapped character is at most 128 away, so an entry is a signed byte.
+// Directory text is stored and compared in the case that these tables give, so they are fixed: they hold the simple
+// case mappings of the Unicode Character Database as far as the first servers knew them, not those of the newest
+// version. Two properties are kept on purpose. A mapping never changes the number of bytes of a character's UTF-8 form
+// (RFC 3629), so text can be folded in place; and the mapped character is at most 128 away, so an entry is a signed
+// byte.
 //
-// Latin to U+01FF is in one table; Greek, Cyrillic, the extensions of Latin and Greek, and full-width Latin are in ranges.
-// Every other character maps to itself, Armenian and Georgian among them. The tables are made by make_uni_case_tables.py.
+// Latin to U+01FF is in one table; Greek, Cyrillic, the extensions of Latin and Greek, and full-width Latin are in
+// ranges. Every other character maps to itself, Armenian and Georgian among them. The tables are made by
+// make_uni_case_tables.py.
 //
 // Everything here may be used from any thread.
 #pragma once

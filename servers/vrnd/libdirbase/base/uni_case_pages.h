@@ -1,8 +1,8 @@
 // The case tables once more, cut into pages by the front bytes of UTF-8, for folding text without a walk per character.
 //
-// A character of two or three bytes in UTF-8 carries its low six bits in its last byte (RFC 3629). So the bytes in front
-// name a page of 64 characters, and the last byte the place on it. Most pages hold no mapping at all and share page 0.
-// The pages are computed from the tables of uni_case.h by the compiler.
+// A character of two or three bytes in UTF-8 carries its low six bits in its last byte (RFC 3629). So the bytes in
+// front name a page of 64 characters, and the last byte the place on it. Most pages hold no mapping at all and share
+// page 0. The pages are computed from the tables of uni_case.h by the compiler.
 //
 // Private to this folder.
 #pragma once

@@ -1,8 +1,8 @@
 // UTF-8 and the folding of text.
 //
-// A text is measured once, and folded with that as its bound: runs of ASCII by words of eight bytes, characters of two and
-// three bytes by the pages of uni_case_pages.h, which are named by the front bytes as they stand. What is rare (an overlong
-// form) goes the long way through a character and back.
+// A text is measured once, and folded with that as its bound: runs of ASCII by words of eight bytes, characters of two
+// and three bytes by the pages of uni_case_pages.h, which are named by the front bytes as they stand. What is rare (an
+// overlong form) goes the long way through a character and back.
 #include "servers/vrnd/libdirbase/base/utf8_text.h"
 
 #include <cstddef>
@@ -55,7 +55,8 @@ struct lower_case {
 
 constexpr byte case_bit = 'a' - 'A';
 
-// Eight bytes below 0x80. The two sums carry into the top bit of a byte from the first letter on, and from behind the last.
+// Eight bytes below 0x80. The two sums carry into the top bit of a byte from the first letter on, and from behind the
+// last.
 template <typename Case>
 constexpr word fold_word(word text)
 {

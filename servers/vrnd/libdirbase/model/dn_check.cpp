@@ -1,4 +1,5 @@
-// The strict checkers: see dn_check.h. Each step of the grammar is a function that moves `at_` on or tells what is wrong.
+// The strict checkers: see dn_check.h. Each step of the grammar is a function that moves `at_` on or tells what is
+// wrong.
 #include "servers/vrnd/libdirbase/model/dn_check.h"
 
 #include <cstring>

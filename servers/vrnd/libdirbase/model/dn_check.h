@@ -1,7 +1,9 @@
 // The strict checkers: whether a text is a DN, or an RDN, by the grammar of LDAP v3 (RFC 2253 section 3).
 //
-// They take less than the normalisers: no trailing separator, no empty value in front of one, no escaped space. Blanks are
-// space, line feed and carriage return. They may be called from any thread and need no schema.
+// They look at the grammar only, without the schema and without resolving values. So they refuse what the normalisers
+// put up with (a trailing separator, an empty value in front of one, an escaped space), and take what these refuse (an
+// empty last value, a "#" value of another type, bytes that aren't UTF-8, any length). Blanks are space, line feed and
+// carriage return. Any thread may call them.
 #pragma once
 
 #include <cstddef>
@@ -10,8 +12,9 @@
 
 extern "C" {
 
-// Check a text. `offset` may be null and else takes the offset of the character at fault. Return LDAP_SUCCESS, also for the
-// empty text, or LDAP_INVALID_DN_SYNTAX with a line in the debug log, also for a null text.
+// Check a text. `offset` may be null and else takes, on failure, the offset of the character at fault (0 for a null
+// text). Return LDAP_SUCCESS, also for the empty text, or LDAP_INVALID_DN_SYNTAX with a line in the debug log, also for
+// a null text.
 DIRBASE_EXPORT int dn_check(const char* dn, std::size_t* offset);
 DIRBASE_EXPORT int rdn_check(const char* rdn, std::size_t* offset);
 

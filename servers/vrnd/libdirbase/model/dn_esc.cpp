@@ -187,7 +187,7 @@ ldapDN_elem33* copy_ldapDN_elem33(const ldapDN_elem33* rdn)
 
 int compare_ldap_escDN(const ldap_escDN* a, const ldap_escDN* b)
 {
-    if (a == nullptr || b == nullptr || a->count != b->count) {
+    if (a == nullptr || b == nullptr || a->internal_error != 0 || b->internal_error != 0 || a->count != b->count) {
         return 0;
     }
     const ldapDN_elem33* other = b->rdns;
@@ -242,7 +242,7 @@ ldap_escDN* ParentDN33(const ldap_escDN* dn)
 
 char* getParentDn(const ldap_escDN* dn)
 {
-    if (dn == nullptr || dn->count < 2) {
+    if (dn == nullptr || dn->internal_error != 0 || dn->count < 2) {
         return nullptr;
     }
     std::size_t length = 0;
@@ -269,8 +269,8 @@ char* getParentDn(const ldap_escDN* dn)
     return text.release();
 }
 
-// The parent is normalised from its canonical text: with bare values, as getParentDn has them, a separator inside a value
-// would make another DN of it.
+// The parent is normalised from its canonical text: with bare values, as getParentDn has them, a separator inside a
+// value would make another DN of it.
 char* getParentDnUpper(const ldap_escDN* dn)
 {
     const escDN_guard parent(ParentDN33(dn));

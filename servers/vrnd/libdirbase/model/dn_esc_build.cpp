@@ -1,5 +1,6 @@
-// From the chain of a DN to its texts: see dn_esc.h. Lengths are known from the parse, so a text is allocated once, in its
-// exact size.
+// From the chain of a DN to its texts: see dn_esc.h. Lengths are known from the parse, so a text is allocated once, in
+// its exact size.
+#include <algorithm>
 #include <cstdlib>
 #include <cstring>
 #include <utility>
@@ -46,8 +47,8 @@ char* write(char* out, const char* text, std::size_t length)
     return out + length;
 }
 
-// Folds so many bytes of a text that ends there to upper case. False when they aren't UTF-8; a zero byte among them was an
-// overlong form.
+// Folds so many bytes of a text that ends there to upper case. False when they aren't UTF-8; a zero byte among them was
+// an overlong form.
 bool fold(char* text, std::size_t length)
 {
     return utfToUpper(text) == 0 && std::memchr(text, '\0', length) == nullptr;
@@ -192,13 +193,17 @@ char* BuildDNString33(ldap_escDN* dn)
 
 char* dn_upcase_esc(ldap_escDN* dn)
 {
+    if (dn->internal_error != 0 || dn->canonical == nullptr || dn->rdns == nullptr) {
+        return dn->upper;
+    }
     const auto length = static_cast<std::size_t>(dn->length);
-    heap_text text = new_text(length + 2);
+    heap_text text = new_text(std::max(length, written_length(*dn)) + 2);
     if (text == nullptr) {
         dn->internal_error = DN_ERR_NO_MEMORY;
         return nullptr;
     }
     bool good = true;
+    *text = '\0';
     if ((dn->all_case_ignore & SC_CIS) != 0) {
         std::memcpy(text.get(), dn->canonical, length + 1);
         good = fold(text.get(), length);
@@ -220,6 +225,7 @@ char* dn_upcase_esc(ldap_escDN* dn)
 void dn_upcaseRDN(const ldapRDN_elem33* pairs, char** out)
 {
     bool good = true;
+    **out = '\0';
     *out = write_upper_pairs(*out, pairs, good);
 }
 

@@ -1,7 +1,7 @@
 // From the text of a DN to its chain: see dn_esc.h.
 //
-// The text is read once. A value without quotes and escapes, which most are, goes to its pair and to the working text by
-// plain copies; everything is measured when it is written and never again.
+// Each element is scanned once. A value without quotes and escapes, which most are, goes to its pair and to the working
+// text by plain copies, and what is written is measured then and never again.
 #include <cstdlib>
 #include <cstring>
 
@@ -233,6 +233,7 @@ int parse_rdns(const char* text, ldap_escDN*& dn, std::size_t room, int order, i
 
 ldap_escDN* normalize(const char* text, int schema)
 {
+    older_dn_processing();  // asked for by the first call, whether or not its text depends on it
     ldap_escDN* dn = parse_escDN(text, dn_order_sorted, schema);
     if (dn != nullptr) {
         getRC(dn);

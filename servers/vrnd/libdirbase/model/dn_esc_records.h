@@ -20,8 +20,8 @@ using escDN_guard = std::unique_ptr<ldap_escDN, free_escDN>;
 using escRDN_guard = std::unique_ptr<ldapDN_elem33, free_escRDN>;
 using esc_pair_guard = std::unique_ptr<ldapRDN_elem33, free_esc_pair>;
 
-// A pair with its type, with room for a value of up to `value_room` bytes and its terminator, and with the lengths of value
-// and escaped value 0. Null without memory.
+// A pair with its type, with room for a value of up to `value_room` bytes and its terminator, and with the lengths of
+// value and escaped value 0. Null without memory.
 esc_pair_guard make_esc_pair(const char* type, std::size_t type_length, std::size_t value_room, std::int64_t syntax);
 
 // The order of the pairs of an RDN.

@@ -237,7 +237,8 @@ char* string_strip_trailing(char* text)
     return text;
 }
 
-// ---- types and values ------------------------------------------------------------------------------------------------
+// ---- types and values
+// ------------------------------------------------------------------------------------------------
 
 const char* dn_attr_get_short_name(const char* name, int* temporary)
 {

@@ -33,8 +33,8 @@ const char* behind_character(const char* at)
     return at + (*at == '\\' && at[1] != '\0' ? 2 : 1);
 }
 
-// The separator or the end behind the pair at `at`: quotes count at the beginning of a value, and what stands there counts
-// as a part of it whatever it is.
+// The separator or the end behind the pair at `at`: quotes count at the beginning of a value, and what stands there
+// counts as a part of it whatever it is.
 const char* end_of_pair(const char* at)
 {
     at += std::strcspn(at, "=");
@@ -75,8 +75,8 @@ guard<rdn_type> make_rdn(const char* text, std::size_t length)
     return rdn;
 }
 
-// Cuts the RDN at `at` into its pairs, moves `at` to the separator behind it, and tells how many pairs there are. Null when
-// one of them is none, and without memory.
+// Cuts the RDN at `at` into its pairs, moves `at` to the separator behind it, and tells how many pairs there are. Null
+// when one of them is none, and without memory.
 guard<rdn_list> cut_rdn(const char*& at, std::size_t& count)
 {
     guard<rdn_list> pairs;

@@ -305,8 +305,8 @@ private:
         return at_ == end_ || is(*at_, dn_chars::separator);
     }
 
-    // "#04", the length in octets, and the octets: the BER form of an OCTET STRING (X.690 section 8.7). The length isn't
-    // looked at, since the digits tell it again.
+    // "#04", the length in octets, and the octets: the BER form of an OCTET STRING (X.690 section 8.7). The length
+    // isn't looked at, since the digits tell it again.
     bool hex_string()
     {
         ++at_;

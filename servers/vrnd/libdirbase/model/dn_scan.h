@@ -32,8 +32,8 @@ struct dn_resolved {
     int error = 0;               // 0 or one of dn_error
 };
 
-// Resolves the value in [at, end) to its bare bytes. `out` has room for as many bytes as the text has. In the older form a
-// "#" begins plain pairs of digits.
+// Resolves the value in [at, end) to its bare bytes. `out` has room for as many bytes as the text has. In the older
+// form a "#" begins plain pairs of digits.
 dn_resolved resolve_value(const char* at, const char* end, char* out, dn_form form);
 
 // Whether the older handling of DNs is on (VRND_V4_DN_PROCESSING): the environment is asked once, at the first use.

@@ -1,9 +1,9 @@
 // Values by their syntax: whether a text is legal, and the typed form in which it is held and compared (RFC 4517).
 //
-// Only integers, booleans and times have a typed form; what is held as text or bytes keeps its text. A syntax is told by
-// its whole code (base/syntax_codes.h). Nothing here keeps or changes a text, and every function may be called from any
-// thread. A null text is no value of any syntax that is looked at: LDAP result 21 (invalid syntax), and what dn_check
-// says in the case of a DN.
+// Only integers, booleans and times have a typed form; what is held as text or bytes keeps its text. A syntax is told
+// by its whole code (base/syntax_codes.h). Nothing here keeps or changes a text, and every function may be called from
+// any thread. A null text is no value of any syntax that is looked at: LDAP result 21 (invalid syntax), and what
+// dn_check says in the case of a DN.
 #pragma once
 
 #include <cstdint>
@@ -21,8 +21,8 @@ DIRBASE_EXPORT int int_str_check(const char* text);
 DIRBASE_EXPORT std::int32_t* str2int(const char* text, int* result);
 DIRBASE_EXPORT std::int32_t* str2bool(const char* text, int* result);
 
-// Whether a text is legal for a syntax: 0; 21; 34 when a DN is bad; 1 when the clock can't be read for a UTC Time. Texts
-// and bytes are always legal, and so is everything of a syntax that isn't known.
+// Whether a text is legal for a syntax: 0; 21; 34 when a DN is bad; 1 when the clock can't be read for a UTC Time.
+// Texts and bytes are always legal, and so is everything of a syntax that isn't known.
 DIRBASE_EXPORT int check_syntax(std::uint32_t syntax, const char* text);
 
 // How many bytes a value takes in a value tree.
@@ -34,11 +34,12 @@ DIRBASE_EXPORT int check_syntax(std::uint32_t syntax, const char* text);
 // Returns 0, or 21 with length 0 for an unknown syntax.
 DIRBASE_EXPORT int find_value_length(std::uint32_t syntax, int text_length, int* length);
 
-// The typed form of a value, in a new block for the caller to free(): of SC_INT and SC_BOOL an std::int32_t, of SC_GT and
-// SC_UTCT a tag_timestamp_struct (timestamp.h).
+// The typed form of a value, in a new block for the caller to free(): of SC_INT and SC_BOOL an std::int32_t, of SC_GT
+// and SC_UTCT a tag_timestamp_struct (timestamp.h).
 //
-//   result  receives 0, with a null return for a syntax that has no typed form; or the failure of str2int, str2bool or
-//           str2timestamp, or 21 for an unknown syntax, and the return is null.
+//   result  receives 0; on failure that of str2int, str2bool or str2timestamp, or 21 for an unknown syntax.
+//
+// Returns null on failure, and for a syntax that has no typed form with a result of 0.
 DIRBASE_EXPORT void* str2syntaxvalue(const char* text, std::uint32_t syntax, int* result);
 
 }  // extern "C"

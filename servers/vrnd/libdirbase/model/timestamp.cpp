@@ -202,7 +202,7 @@ const char* read_fraction(const char* digits, std::int32_t& fraction)
     return digits + count;
 }
 
-// The year that ends in two digits and is nearest to the present one, in the sense of str2UTCTime.
+// The year that ends in two digits and is in the window around the present one, in the sense of str2UTCTime.
 int find_century(int two_digits, std::int16_t& year)
 {
     const std::time_t now = std::time(nullptr);

@@ -1,14 +1,14 @@
-// Times as values: from the texts of Generalized Time and UTC Time (RFC 4517, 3.3.13 and 3.3.34) to one record, which is
-// in Coordinated Universal Time.
+// Times as values: from the texts of Generalized Time and UTC Time (RFC 4517, 3.3.13 and 3.3.34) to one record, which
+// is in Coordinated Universal Time.
 //
 // The forms read here are those that the server has always stored. They are narrower than the RFC's in that Generalized
-// Time must have its seconds, that 60 is no second, and that a zone has four digits; they are wider in that a text without
-// a zone is a local time, and that any four digits make an offset.
+// Time must have its seconds, that 60 is no second, and that a zone has four digits; they are wider in that a text
+// without a zone is a local time, and that any four digits make an offset.
 //
-// A text is refused with LDAP result 21 (invalid syntax). So is a null text, and one of more than 29 characters. The debug
-// log tells which field was bad, except for the zone and for a day that is past the end of its month. Nothing here locks,
-// and every function may be called from any thread. Local times and the present year follow the process's time zone: no
-// thread may change the variable TZ meanwhile.
+// A text is refused with LDAP result 21 (invalid syntax). So is a null text, and one of more than 29 characters. The
+// debug log tells which field was bad, except for these two, the zone, and a day that is past the end of its month.
+// Nothing here locks, and every function may be called from any thread. Local times and the present year follow the
+// process's time zone: no thread may change the variable TZ meanwhile.
 #pragma once
 
 #include <cstddef>
@@ -38,7 +38,7 @@ DIRBASE_EXPORT int check_date(const tag_timestamp_struct* time);
 
 // Brings a time to UTC.
 //
-//   time  not null, and a date that check_date passes; others come to no harm and make no sense.
+//   time  not null, and a date that check_date passes; of any other the result makes no sense.
 //   zone  what followed the time in the text. "Z": it is UTC already. A sign and four digits: it is that many hours and
 //         minutes ahead of UTC, or behind. Nothing: it is local, and never daylight-saving, time.
 //
@@ -58,8 +58,8 @@ DIRBASE_EXPORT int adjust_to_UTC(tag_timestamp_struct* time, const char* zone);
 // Returns 0 or 21.
 DIRBASE_EXPORT int str2GeneralizedTime(const char* text, tag_timestamp_struct* time);
 
-// Reads YYMMDDHHMM, then SS if any, then a zone or none. The year is the one of that ending from 79 years before the
-// present local year to 20 years after it.
+// Reads YYMMDDHHMM, then SS if any, then a zone or none. The two digits stand for a
+// year from 79 years before the present local year to 20 years after it.
 //
 //   time  receives the time, on success only; null to check the text only.
 //

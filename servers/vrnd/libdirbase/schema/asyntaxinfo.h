@@ -1,7 +1,7 @@
 // The flat records through which the rest of the server knows attribute types and object classes.
 //
-// A record belongs to its definition: it is made when it is first asked for and lives as long as the definition, or until it
-// is reset. Callers read it and never free it. All pointers are owned by the record and come from malloc.
+// A record belongs to its definition: it is made when it is first asked for and lives as long as the definition, or
+// until it is reset. Callers read it and never free it. All pointers are owned by the record and come from malloc.
 #pragma once
 
 #include <cstdint>
@@ -12,8 +12,8 @@ struct rdbm_col_info {
     std::uint16_t length;
 };
 
-// What a relational back end hangs on a record: a list of blocks from malloc that begin with this link. They are freed with
-// the record.
+// What a relational back end hangs on a record: a list of blocks from malloc that begin with this link. They are freed
+// with the record.
 struct asyntaxinfo_back_end {
     asyntaxinfo_back_end* next;
 };

@@ -66,8 +66,8 @@ heap_text without_binary(const char* name, std::size_t length)
     return info != nullptr && info->syntax == SC_BIN ? info : nullptr;
 }
 
-// The name in front of language tags: null in `base` when there are none. False when a tag is too long or memory ran out.
-// Whether the tags are language tags is not looked at.
+// The name in front of language tags: null in `base` when there are none. False when a tag is too long or memory ran
+// out. Whether the tags are language tags is not looked at.
 bool split_language_tags(const char* name, heap_text& base)
 {
     const char* tags = std::strchr(name, ';');
@@ -101,8 +101,7 @@ const T* find(const ldcf_map_name_to<T>& map, const char* name)
         debug_error("ldcf_api_attr_get_info(): parse_language_tags() failed.\n");
         return nullptr;
     }
-    asyntaxinfo* info =
-        ldcf_attrtype_get_info(ldcf_schema_g->attribute_types, base == nullptr ? name : base.get());
+    asyntaxinfo* info = ldcf_attrtype_get_info(ldcf_schema_g->attribute_types, base == nullptr ? name : base.get());
     if (base_out != nullptr) {
         *base_out = base.release();
     }

@@ -1,8 +1,8 @@
 // The door to the schema for the rest of the server: plain functions that see names and flat records, not the classes.
 //
-// Look-ups, predicates and lists answer from the active schema. They take no lock: any number of threads may call them while
-// the caller holds the read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g), or while no change can be in
-// progress. The life cycle runs on one thread at start-up. No function raises an exception.
+// Look-ups, predicates and lists answer from the active schema. They take no lock: any number of threads may call them
+// while the caller holds the read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g), or while no change
+// can be in progress. The life cycle runs on one thread at start-up. No function raises an exception.
 #pragma once
 
 #include "servers/vrnd/libdirbase/base/backend.h"
@@ -20,12 +20,12 @@ extern "C" {
 
 // ---- life cycle, in this order ------------------------------------------------------------------------------------
 
-// Makes the schema lock, forgets the kept schema entry without freeing it and, at the first call, empties the name cache.
-// Nobody may hold the lock. Returns 0.
+// Makes the schema lock, forgets the kept schema entry without freeing it and, at the first call, empties the name
+// cache. Nobody may hold the lock. Returns 0.
 DIRBASE_EXPORT int ldcf_api_schema_init(void);
 
-// Reads one schema file into the active schema. Returns 0, or 1 when anything is wrong with it: the message log tells (it is
-// no longer quiet about exceptions from here on), and the definitions in front of the fault stay.
+// Reads one schema file into the active schema. Returns 0, or 1 when anything is wrong with it: the message log tells
+// (it is no longer quiet about exceptions from here on), and the definitions in front of the fault stay.
 DIRBASE_EXPORT int ldcf_api_schema_parse(const char* file);
 
 // Links and checks the active schema. Returns 0, or 1 for a schema that can't be used.
@@ -36,13 +36,13 @@ DIRBASE_EXPORT int ldcf_api_schema_complete_db_names(void);
 
 // ---- the schemas and their lock -----------------------------------------------------------------------------------
 
-// The active schema, which is never null, and that of the change in progress: null before the first change, the active one
-// after a change that went through, and an empty one after a change that didn't.
+// The active schema, which is never null, and that of the change in progress: null before the first change, the active
+// one after a change that went through, and an empty one after a change that didn't.
 DIRBASE_EXPORT ldcf_schema* ldcf_api_get_schema_g(void);
 DIRBASE_EXPORT ldcf_schema* ldcf_api_get_schema_proposed_g(void);
 
-// The lock "ldcf_modify_attr_info_lock": held for reading through every operation, for writing while the active schema is
-// replaced.
+// The lock "ldcf_modify_attr_info_lock": held for reading through every operation, for writing while the active schema
+// is replaced.
 DIRBASE_EXPORT extern rdbm_lock_t ldcf_api_modify_attr_info_lock_g;
 DIRBASE_EXPORT rdbm_lock_t* ldcf_api_get_modify_attr_info_lock_g(void);
 
@@ -56,9 +56,9 @@ DIRBASE_EXPORT extern Entry* ldcf_api_schema_entry_g;
 
 // ---- look-ups -----------------------------------------------------------------------------------------------------
 
-// The record of an attribute type by name or OID, with or without "oid." in front, a language tag or ";binary" behind (the
-// latter for types of binary syntax only). Null for a name that the schema lacks, a null or empty name, and a type that
-// can't have a record.
+// The record of an attribute type by name or OID, with or without "oid." in front, a language tag or ";binary" behind
+// (the latter for types of binary syntax only). Null for a name that the schema lacks, a null or empty name, and a type
+// that can't have a record.
 //
 //   base_out  may be null. For a name that the cache doesn't hold it receives the name without its language tags, a text for
 //             the caller to free(), or null when it has none, its tags are too long (240 bytes) or memory ran out. For a name
@@ -67,61 +67,62 @@ DIRBASE_EXPORT extern Entry* ldcf_api_schema_entry_g;
 // A name that the cache holds costs no allocation (RFC 4512 section 2.5, RFC 3866).
 DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info(const char* name, char** base_out);
 
-// The OID of an attribute type by name or OID, with or without "oid." in front and ";binary" behind (for types of any syntax);
-// owned by the type. Null for a name that the schema lacks, one with language tags, and a null or empty one.
+// The OID of an attribute type by name or OID, with or without "oid." in front and ";binary" behind (for types of any
+// syntax); owned by the type. Null for a name that the schema lacks, one with language tags, and a null or empty one.
 DIRBASE_EXPORT const char* ldcf_api_attr_get_oid(const char* name);
 
-// The record of an attribute type of the proposed schema, by plain name or OID. Null when there is none, as for the active
-// schema, and before the first change; it goes with the proposed schema.
+// The record of an attribute type of the proposed schema, by plain name or OID. Null when there is none, as for the
+// active schema, and before the first change; it goes with the proposed schema.
 DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info_from_proposed_schema(const char* name);
 
-// The record of the first type, in the order of keys (OIDs first, then names), whose values are in this table, without regard
-// to case; null when there is none.
+// The record of the first type, in the order of keys (OIDs first, then names), whose values are in this table, without
+// regard to case; null when there is none.
 DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info_based_on_table(const char* table);
 
 // The record of an object class by name or OID; null when the schema lacks it.
 DIRBASE_EXPORT objectclassinfo* ldcf_api_objectclass_get_info(const char* name);
 
-// Calls a function with the record of every attribute type, once each. Returns 0, or 80 when a type has no record or the
-// function gives anything but 0.
+// Calls a function with the record of every attribute type, once each. Returns 0, or 80 when a type has no record or
+// the function gives anything but 0.
 DIRBASE_EXPORT int ldcf_api_attrtype_apply(ldcf_attrtype_function function, void* argument);
 
-// Free a record that belongs to no definition; null does nothing. The first also empties the name cache: under the write side
-// of the schema lock.
+// Free a record that belongs to no definition; null does nothing. The first also empties the name cache: under the
+// write side of the schema lock.
 DIRBASE_EXPORT void ldcf_api_delete_asyntaxinfo(asyntaxinfo* info);
 DIRBASE_EXPORT void ldcf_api_delete_objectclassinfo(objectclassinfo* info);
 
-// Drops the record of an attribute type, if it has one, so that the next look-up makes it anew, and empties the name cache,
-// which ldcf_api_load_attr_hash fills again. Under the write side of the schema lock. A name that the schema lacks does
-// nothing.
+// Drops the record of an attribute type, if it has one, so that the next look-up makes it anew, and empties the name
+// cache, which ldcf_api_load_attr_hash fills again. Under the write side of the schema lock. A name that the schema
+// lacks does nothing.
 DIRBASE_EXPORT void ldcf_api_attrtype_reset_info(const char* name);
 
-// The table of a record (null without tables; not to be changed), and what to do with the text afterwards: nothing, it stays
-// with the record.
+// The table of a record (null without tables; not to be changed), and what to do with the text afterwards: nothing, it
+// stays with the record.
 DIRBASE_EXPORT char* get_qualified_table_name(asyntaxinfo* info);
 DIRBASE_EXPORT void free_qualified_table_name(char* name);
 
-// Puts the names and OIDs of the active schema's attribute types into the name cache, but for types whose primary name is
-// there already or that have no record. At start-up or under the write side of the schema lock.
+// Puts the names and OIDs of the active schema's attribute types into the name cache, but for types whose primary name
+// is there already or that have no record. At start-up or under the write side of the schema lock.
 DIRBASE_EXPORT void ldcf_api_load_attr_hash(void);
 
-// ---- predicates: false for a name that the schema lacks ---------------------------------------------------------------
+// ---- predicates: false for a name that the schema lacks
+// ---------------------------------------------------------------
 
-DIRBASE_EXPORT bool ldcf_api_is_langtag_attr(const char* name);     // may carry language tags
-DIRBASE_EXPORT bool ldcf_api_is_unique_attr(const char* name);      // may be made unique over the directory
-DIRBASE_EXPORT bool ldcf_api_is_attrcache_attr(const char* name);   // no user attribute
-DIRBASE_EXPORT bool ldcf_api_is_config_attr(const char* name);      // a configuration attribute
-DIRBASE_EXPORT bool ldcf_api_is_operational_attr(const char* name); // neither user nor configuration attribute
-DIRBASE_EXPORT bool ldcf_api_is_encryptable_attr(const char* name); // may be encrypted
-DIRBASE_EXPORT bool ldcf_api_is_encrypted_attr(const char* name);   // is encrypted
-DIRBASE_EXPORT bool ldcf_api_is_binary_syntax(const char* oid);     // takes the OID of a syntax
+DIRBASE_EXPORT bool ldcf_api_is_langtag_attr(const char* name);      // may carry language tags
+DIRBASE_EXPORT bool ldcf_api_is_unique_attr(const char* name);       // may be made unique over the directory
+DIRBASE_EXPORT bool ldcf_api_is_attrcache_attr(const char* name);    // no user attribute
+DIRBASE_EXPORT bool ldcf_api_is_config_attr(const char* name);       // a configuration attribute
+DIRBASE_EXPORT bool ldcf_api_is_operational_attr(const char* name);  // neither user nor configuration attribute
+DIRBASE_EXPORT bool ldcf_api_is_encryptable_attr(const char* name);  // may be encrypted
+DIRBASE_EXPORT bool ldcf_api_is_encrypted_attr(const char* name);    // is encrypted
+DIRBASE_EXPORT bool ldcf_api_is_binary_syntax(const char* oid);      // takes the OID of a syntax
 
 // False for the few attribute types that can't carry language tags, by OID.
 DIRBASE_EXPORT bool checkIfLangTagAttrByOid(const char* oid);
 
-// ---- lists: primary names, a new null-terminated array for charray_free ------------------------------------------------
-// In the order of the schema's keys: OIDs come first, so that of the OIDs. Null when memory ran out. What a list without
-// members gives is said with it.
+// ---- lists: primary names, a new null-terminated array for charray_free
+// ------------------------------------------------ In the order of the schema's keys: OIDs come first, so that of the
+// OIDs. Null when memory ran out. What a list without members gives is said with it.
 
 DIRBASE_EXPORT char** ldcf_api_get_langtag_attrs(void);         // null
 DIRBASE_EXPORT char** ldcf_api_get_nonlangtag_attrs(void);      // null
@@ -142,20 +143,30 @@ DIRBASE_EXPORT char** ldcf_api_get_nonencrypted_attrs(void);    // an empty arra
 DIRBASE_EXPORT int ldcf_api_schema_contains_encrypted_attributes(void);
 
 // ---- for callers that know the classes -----------------------------------------------------------------------------
+// Plain names, like all others here, though no C program can use what they return.
+
+#ifdef __clang__
+#pragma clang diagnostic push
+#pragma clang diagnostic ignored "-Wreturn-type-c-linkage"
+#endif
 
 // The attribute types that a complete class requires, or permits, inherited ones included.
 DIRBASE_EXPORT const csgl_set<ldcf_attrtype>& ldcf_api_get_must_set_from_objclass(const ldcf_objclass& objclass);
 DIRBASE_EXPORT const csgl_set<ldcf_attrtype>& ldcf_api_get_may_set_from_objclass(const ldcf_objclass& objclass);
 
-// The definition under a name that the schema holds; there is no answer for another name, nor without a proposed schema. It
-// lives as long as the schema holds it.
+// The definition under a name that the schema holds; there is no answer for another name, nor without a proposed
+// schema. It lives as long as the schema holds it.
 DIRBASE_EXPORT const ldcf_attrtype& ldcf_api_get_attrtype_from_schema_g(const char* name);
 DIRBASE_EXPORT const ldcf_attrtype& ldcf_api_get_attrtype_from_proposed_schema_g(const char* name);
 DIRBASE_EXPORT const ldcf_objclass& ldcf_api_get_objclass_from_schema_g(const char* name);
 DIRBASE_EXPORT const ldcf_objclass& ldcf_api_get_objclass_from_proposed_schema_g(const char* name);
 
-// The record of the definition that a map holds under a name or an OID; null when the map lacks it or the record can't be
-// made. The second takes the first type, in the order of keys, whose values are in this table.
+#ifdef __clang__
+#pragma clang diagnostic pop
+#endif
+
+// The record of the definition that a map holds under a name or an OID; null when the map lacks it or the record can't
+// be made. The second takes the first type, in the order of keys, whose values are in this table.
 DIRBASE_EXPORT asyntaxinfo* ldcf_attrtype_get_info(const ldcf_map_name_to<ldcf_attrtype>& map, const char* name);
 DIRBASE_EXPORT asyntaxinfo* ldcf_attrtype_get_info_based_on_table(const ldcf_map_name_to<ldcf_attrtype>& map,
                                                                   const char* table);

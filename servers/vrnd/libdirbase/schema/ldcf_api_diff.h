@@ -31,9 +31,9 @@ struct ldcf_diff_info {
 extern "C" {
 
 // What has changed in the MUST and MAY lists of a class that exists in both schemas; inherited attributes don't count.
-// Returns a new record, for the caller to take apart with ldcf_api_list_diff_info_delete on its list and free(), or null
-// when memory ran out, when the class is missing in one of the schemas or there has been no change yet. After a change that
-// went through both schemas are one, and nothing differs. The list runs against the order of OIDs.
+// Returns a new record, for the caller to take apart with ldcf_api_list_diff_info_delete on its list and free(), or
+// null when memory ran out, when the class is missing in one of the schemas or there has been no change yet. After a
+// change that went through both schemas are one, and nothing differs. The list runs against the order of OIDs.
 DIRBASE_EXPORT ldcf_diff_info* ldcf_api_get_diff_info(const ldcf_objclass& objclass);
 
 // 0 when the class is of one kind (abstract, structural, auxiliary) in both schemas, 1 when not, -1 when one lacks it.

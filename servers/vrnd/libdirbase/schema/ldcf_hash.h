@@ -1,7 +1,8 @@
 // The name cache: attribute names to flat records, in front of the schema's maps.
 //
-// A fixed number of slots, each the head of a chain; keys are names folded to upper case. Any number of threads may look
-// names up while nobody changes the cache. It is filled and emptied at start-up and under the write side of the schema lock.
+// A fixed number of slots, each the head of a chain; keys are names folded to upper case. Any number of threads may
+// look names up while nobody changes the cache. It is filled and emptied at start-up and under the write side of the
+// schema lock.
 #pragma once
 
 #include <cstddef>
@@ -23,11 +24,12 @@ struct ldcf_hash_tbl_entry {
 
 extern "C" {
 
-// The slot of a key: the hash of ELF symbol tables over its bytes as they stand, taken as signed. A name is folded first.
+// The slot of a key: the hash of ELF symbol tables over its bytes as they stand, taken as signed. A name is folded
+// first.
 DIRBASE_EXPORT std::uint32_t ldcf_hash_name(const char* key);
 
-// The node of a name, without regard to case (only bytes from 'a' to 0x7f fold); null when the cache lacks it, the name is
-// null or has more than ldcf_hash_longest_key bytes.
+// The node of a name, without regard to case (only bytes from 'a' to 0x7f fold); null when the cache lacks it, the name
+// is null or has more than ldcf_hash_longest_key bytes.
 DIRBASE_EXPORT const ldcf_hash_tbl_entry* ldcf_hash_get(const char* name);
 
 // Adds a node ahead of all others of its slot. A null or too long name, or no memory, adds nothing.

@@ -1,8 +1,8 @@
 // The way by which look-ups find their node in the name cache.
 //
 // The hash of ELF symbol tables, which gives a name its slot, takes each character after the last, and the fixed slots
-// begin to chain in a large schema. So beside the slots stands a table of wide hashes, made of eight bytes at a time, each
-// with the first node of its key. A look-up that hits costs little more than reading the name.
+// begin to chain in a large schema. So beside the slots stands a table of wide hashes, made of eight bytes at a time,
+// each with the first node of its key. A look-up that hits costs little more than reading the name.
 //
 // Private to this folder; the rules are those of ldcf_hash.h.
 #pragma once
@@ -30,8 +30,8 @@ inline ldcf_key_word ldcf_fold_key(ldcf_key_word text)
     return text ^ (above >> 2);
 }
 
-// A name as it is sought: its first and its last eight bytes, which overlap in a name of less than sixteen and say all of
-// it, and its hash, which is spread best over the high bits.
+// A name as it is sought: its first and its last eight bytes, which overlap in a name of less than sixteen and say all
+// of it, and its hash, which is spread best over the high bits.
 class ldcf_sought_name {
 public:
     ldcf_sought_name(const char* text, std::size_t length) : text_(text), length_(length)
@@ -132,8 +132,7 @@ private:
     place& place_of(const ldcf_sought_name& name) const
     {
         std::size_t at = start_of(name.hash());
-        while (places_[at].node != nullptr &&
-               (places_[at].hash != name.hash() || !name.is_key_of(*places_[at].node))) {
+        while (places_[at].node != nullptr && (places_[at].hash != name.hash() || !name.is_key_of(*places_[at].node))) {
             at = next(at);
         }
         return places_[at];

@@ -44,8 +44,8 @@ public:
     const csgl_string& xan_string() const;
     void v3_file(const csgl_string& file);
 
-    // The flat record, made when it is first asked for and owned by the class; null when memory ran out. Readers may ask
-    // at the same time.
+    // The flat record, made when it is first asked for and owned by the class; null when memory ran out. Readers may
+    // ask at the same time.
     objectclassinfo* info() const;
 
     ldcf_objclass clone() const;

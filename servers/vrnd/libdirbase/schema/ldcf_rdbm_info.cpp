@@ -24,7 +24,7 @@ constexpr int server_without_tables = 1;
 constexpr int longest_text_column = 32700;
 constexpr int longest_column = std::numeric_limits<std::uint16_t>::max();
 constexpr std::uint16_t indexable_length = 240;
-constexpr std::size_t longest_plain_table = 17;       // behind the qualifier
+constexpr std::size_t longest_plain_table = 17;  // behind the qualifier
 constexpr std::size_t short_qualifier_length = 8;
 constexpr std::size_t short_table_front = 10;
 constexpr std::size_t short_table_size = 28;
@@ -92,20 +92,13 @@ struct rule_code {
 };
 
 constexpr rule_code equality_codes[] = {
-    {ldcf_rule_case_exact, SC_CES},
-    {ldcf_rule_case_exact_ia5, SC_CES},
-    {ldcf_rule_case_ignore, SC_CIS},
-    {ldcf_rule_case_ignore_ia5, SC_CIS},
-    {ldcf_rule_octet_string, SC_CIS},
-    {ldcf_rule_oid, SC_CIS},
-    {ldcf_rule_oid_first, SC_CIS},
-    {ldcf_rule_dn, SC_DN | SC_CIS},
-    {ldcf_rule_generalized_time, SC_GT},
-    {ldcf_rule_integer, SC_INT},
-    {ldcf_rule_integer_first, SC_INT},
-    {ldcf_rule_numeric_string, SC_NUMERIC_STRING | SC_CIS},
-    {ldcf_rule_telephone, SC_TEL | SC_CIS},
-    {ldcf_rule_utc_time, SC_UTCT},
+    {ldcf_rule_case_exact, SC_CES},         {ldcf_rule_case_exact_ia5, SC_CES},
+    {ldcf_rule_case_ignore, SC_CIS},        {ldcf_rule_case_ignore_ia5, SC_CIS},
+    {ldcf_rule_octet_string, SC_CIS},       {ldcf_rule_oid, SC_CIS},
+    {ldcf_rule_oid_first, SC_CIS},          {ldcf_rule_dn, SC_DN | SC_CIS},
+    {ldcf_rule_generalized_time, SC_GT},    {ldcf_rule_integer, SC_INT},
+    {ldcf_rule_integer_first, SC_INT},      {ldcf_rule_numeric_string, SC_NUMERIC_STRING | SC_CIS},
+    {ldcf_rule_telephone, SC_TEL | SC_CIS}, {ldcf_rule_utc_time, SC_UTCT},
 };
 
 constexpr rule_code substring_codes[] = {
@@ -117,10 +110,8 @@ constexpr rule_code substring_codes[] = {
 };
 
 constexpr rule_code ordering_codes[] = {
-    {ldcf_rule_case_exact_ordering, SC_CES},
-    {ldcf_rule_case_ignore_ordering, SC_CIS},
-    {ldcf_rule_dn_ordering, SC_DN | SC_CIS},
-    {ldcf_rule_numeric_string_ordering, SC_NUMERIC_STRING | SC_CIS},
+    {ldcf_rule_case_exact_ordering, SC_CES},      {ldcf_rule_case_ignore_ordering, SC_CIS},
+    {ldcf_rule_dn_ordering, SC_DN | SC_CIS},      {ldcf_rule_numeric_string_ordering, SC_NUMERIC_STRING | SC_CIS},
     {ldcf_rule_generalized_time_ordering, SC_GT},
 };
 

@@ -1,8 +1,8 @@
 // Case folding of directory text against a plain copying pass over the same bytes.
 //
 // Each call folds the other way than the one before, so that every call finds all its letters to change. `ratio` is the
-// speed as a part of the copying pass's, and `goal` what the ratio has to reach on this machine: the part that 1 GB/s is
-// of the copying pass, or a quarter where the machine is too slow for that.
+// speed as a part of the copying pass's, and `goal` what the ratio has to reach on this machine: the part that 1 GB/s
+// is of the copying pass, or a quarter where the machine is too slow for that.
 #include <benchmark/benchmark.h>
 
 #include <algorithm>

@@ -1,7 +1,7 @@
 // Normalising DNs with the shipped schema, against folding the same text and taking one block of memory a pair.
 //
-// `allocations` is of one DN, and at most `allocations_goal`: four, one a pair and one an RDN. `ns` is the best time of one
-// normalisation with the release of its record.
+// `allocations` is of one DN, and at most `allocations_goal`: four, one a pair and one an RDN. `ns` is the best time of
+// one normalisation with the release of its record.
 #include <benchmark/benchmark.h>
 
 #include <cstdlib>

@@ -2,8 +2,8 @@
 //
 // A round looks up every name of the schema once, in random order, spelled as the schema spells it. The yardstick is
 // std::unordered_map<std::string, ...>::find of the same names in the same order, already folded to upper case, in the
-// same run. `ratio` is one over the other. On the large schema the fixed number of slots begins to chain, and both sides
-// begin to wait for memory.
+// same run. `ratio` is one over the other. On the large schema the fixed number of slots begins to chain, and both
+// sides begin to wait for memory.
 #include <benchmark/benchmark.h>
 
 #include <atomic>
@@ -135,9 +135,17 @@ void look_up_with(benchmark::State& state, const char* tail)
     state.counters["ns_per_name"] = looking.seconds() * 1e9 / static_cast<double>(names.size());
 }
 BENCHMARK_CAPTURE(look_up_with, language_tag, ";lang-en")
-    ->ArgName("large")->Arg(shipped)->Arg(large)->Iterations(50)->UseManualTime();
+    ->ArgName("large")
+    ->Arg(shipped)
+    ->Arg(large)
+    ->Iterations(50)
+    ->UseManualTime();
 BENCHMARK_CAPTURE(look_up_with, binary, ";binary")
-    ->ArgName("large")->Arg(shipped)->Arg(large)->Iterations(50)->UseManualTime();
+    ->ArgName("large")
+    ->Arg(shipped)
+    ->Arg(large)
+    ->Iterations(50)
+    ->UseManualTime();
 
 // The same rounds on one thread and on two, by the clock on the wall; `speedup` is that of two.
 void BM_AttrGetInfoThreads(benchmark::State& state)
@@ -148,8 +156,7 @@ void BM_AttrGetInfoThreads(benchmark::State& state)
         std::atomic<std::size_t> waiting{threads};
         const auto reader = [&] {
             --waiting;
-            while (waiting != 0) {
-            }
+            while (waiting != 0) {}
             for (std::size_t i = 0; i < rounds; ++i) {
                 look_up(schema.names());
             }

@@ -1,5 +1,5 @@
-// Any text through the checkers, the in-place normaliser and the older machines: a text never grows, and what the checker
-// takes it takes after the cleaning too.
+// Any text through the checkers, the in-place normaliser and the older machines: a text never grows, and what the
+// checker takes it takes after the cleaning too.
 #include <cstdlib>
 #include <cstring>
 

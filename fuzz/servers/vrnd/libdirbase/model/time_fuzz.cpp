@@ -1,4 +1,5 @@
-// Both time parsers on any text, against the slow implementation of the tests. Local time is five and a half hours ahead.
+// Both time parsers on any text, against the slow implementation of the tests. Local time is five and a half hours
+// ahead.
 #include <chrono>
 #include <cstddef>
 #include <cstdint>

@@ -67,9 +67,9 @@ std::vector<char*> elements(char** array)
 // One call on an array; `text` and `other` are for it to take when it succeeds.
 struct addition {
     int (*call)(char*** array, char* text, char** other);
-    const char* name;     // as the debug line has it
-    std::size_t points;   // allocations, the array's own growth last
-    bool takes_text;      // else the texts of `other`
+    const char* name;    // as the debug line has it
+    std::size_t points;  // allocations, the array's own growth last
+    bool takes_text;     // else the texts of `other`
     bool takes_other;
 };
 

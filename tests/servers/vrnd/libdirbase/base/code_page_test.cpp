@@ -272,8 +272,8 @@ TEST_F(CodePage, LinesComeAsTheyStandInPiecesOfTheBuffersSizeOrNotAtAll)
         }
         return lines;
     };
-    const std::vector<std::string> all = {"first \xE9\n", "\n", long_line.substr(0, 1023), long_line.substr(1023) + "\n",
-                                          "no line feed"};
+    const std::vector<std::string> all = {"first \xE9\n", "\n", long_line.substr(0, 1023),
+                                          long_line.substr(1023) + "\n", "no line feed"};
     EXPECT_EQ(lines_of_file(), all);
     EXPECT_EQ(open_conversions, 0);
 

@@ -1,5 +1,5 @@
-// Random bytes and identifiers. The digest's functions are met on their way from the library, so that what enters into a
-// result can be looked at and the result made again.
+// Random bytes and identifiers. The digest's functions are met on their way from the library, so that what enters into
+// a result can be looked at and the result made again.
 #include <gtest/gtest.h>
 
 #include <algorithm>

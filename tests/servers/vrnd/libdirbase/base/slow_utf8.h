@@ -57,7 +57,8 @@ inline std::string slow_encode(std::int32_t character)
     return text;
 }
 
-// Folds a text without zero bytes, character by character, as utfToUpper and utfToLower do by UniToupper and UniTolower.
+// Folds a text without zero bytes, character by character, as utfToUpper and utfToLower do by UniToupper and
+// UniTolower.
 inline int slow_fold(std::string& text, std::int32_t (*map)(std::int32_t))
 {
     const std::string before = text;

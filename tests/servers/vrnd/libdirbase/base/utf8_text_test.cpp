@@ -154,8 +154,8 @@ TEST(UtfToCase, EveryCharacterFoldsAsItsMapSays)
     }
 }
 
-// Text of everything there is: runs of ASCII of all lengths, letters of two and three bytes, overlong forms, and now and
-// then bytes at random.
+// Text of everything there is: runs of ASCII of all lengths, letters of two and three bytes, overlong forms, and now
+// and then bytes at random.
 std::string random_text(std::mt19937& random)
 {
     const auto below = [&](unsigned limit) { return static_cast<std::int32_t>(random() % limit); };

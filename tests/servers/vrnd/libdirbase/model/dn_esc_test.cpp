@@ -241,7 +241,8 @@ TEST_F(DnNormalize, TheOlderHandlingEscapesEveryHash)
         testing::ExitedWithCode(0), "");
 }
 
-// ---- random DNs ---------------------------------------------------------------------------------------------------------
+// ---- random DNs
+// ---------------------------------------------------------------------------------------------------------
 
 struct slow_type {
     std::vector<std::string> spellings;  // the first is the schema's first name
@@ -411,7 +412,8 @@ TEST_F(DnNormalize, RandomDnsComeOutAsOneWhateverTheirSpelling)
     }
 }
 
-// ---- what stands beside the normaliser --------------------------------------------------------------------------------------
+// ---- what stands beside the normaliser
+// --------------------------------------------------------------------------------------
 
 TEST_F(DnNormalize, ComparisonIgnoresCaseAndTellsValuesApart)
 {
@@ -442,7 +444,7 @@ TEST_F(DnNormalize, ParentsKeepWhatTheirValuesMean)
          "A-NAME-THAT-TAKES-MUCH-MORE-ROOM-THAN-THE-NUMBER-IT-IS-WRITTEN-BY=B",
          "a-name-that-takes-much-more-room-than-the-number-it-is-written-by=b,",
          "A-NAME-THAT-TAKES-MUCH-MORE-ROOM-THAN-THE-NUMBER-IT-IS-WRITTEN-BY=B"},
-        {"cn=a,cn=b,cn", "34, 1", "cn=b,", "(null)"},
+        {"cn=a,cn=b,cn", "34, 1", "(null)", "(null)"},
         {"o=x", "(null)", "(null)", "(null)"},
         {"", "(null)", "(null)", "(null)"},
     };

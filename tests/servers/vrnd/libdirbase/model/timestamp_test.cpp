@@ -1,5 +1,5 @@
-// Times: tables, and random texts against the slow second implementation of slow_time.h. The present is one of our making, and local time is
-// five and a half hours ahead, so that a new year begins here first.
+// Times: tables, and random texts against the slow second implementation of slow_time.h. The present is one of our
+// making, and local time is five and a half hours ahead, so that a new year begins here first.
 #include <gtest/gtest.h>
 
 #include <chrono>

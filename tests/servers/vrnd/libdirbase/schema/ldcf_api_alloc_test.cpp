@@ -1,4 +1,5 @@
-// The schema interface with every allocation failing in turn: null or a shorter answer, no leak, and the next try works.
+// The schema interface with every allocation failing in turn: null or a shorter answer, no leak, and the next try
+// works.
 #include <functional>
 #include <memory>
 

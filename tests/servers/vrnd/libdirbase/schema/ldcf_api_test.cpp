@@ -51,13 +51,13 @@ std::string joined(char** names)
 }
 
 // One of each kind that a predicate or a list asks about; "plain" is none of them.
-constexpr char property_text[] =
-    "attributeTypes { ( 2.5.4.0 NAME 'objectClass' SYNTAX " ARC "38 ) ( 2.5.4.3 NAME ( 'cn' 'alias' ) SYNTAX " ARC "15 )\n"
-    "( 2.5.4.31 NAME 'member' SYNTAX " ARC "12 ) ( 7.1 NAME 'plain' SYNTAX " ARC "15 )\n"
-    "( 7.2 NAME 'bin' SYNTAX " ARC "5 ) ( 7.3 NAME 'photo' SYNTAX " ARC "28 )\n"
-    "( 7.4 NAME 'operation' SYNTAX " ARC "15 USAGE directoryOperation )\n"
-    "( 7.5 NAME 'hashed' SYNTAX " ARC "15 ) ( 7.6 NAME 'secured' SYNTAX " ARC "15 ) }\n"
-    "XANattributeTypes { ( 7.5 ENCRYPT SSHA ) ( 7.6 SECURE-CONNECTION-REQUIRED ) }\n";
+constexpr char property_text[] = "attributeTypes { ( 2.5.4.0 NAME 'objectClass' SYNTAX " ARC
+                                 "38 ) ( 2.5.4.3 NAME ( 'cn' 'alias' ) SYNTAX " ARC "15 )\n"
+                                 "( 2.5.4.31 NAME 'member' SYNTAX " ARC "12 ) ( 7.1 NAME 'plain' SYNTAX " ARC "15 )\n"
+                                 "( 7.2 NAME 'bin' SYNTAX " ARC "5 ) ( 7.3 NAME 'photo' SYNTAX " ARC "28 )\n"
+                                 "( 7.4 NAME 'operation' SYNTAX " ARC "15 USAGE directoryOperation )\n"
+                                 "( 7.5 NAME 'hashed' SYNTAX " ARC "15 ) ( 7.6 NAME 'secured' SYNTAX " ARC "15 ) }\n"
+                                 "XANattributeTypes { ( 7.5 ENCRYPT SSHA ) ( 7.6 SECURE-CONNECTION-REQUIRED ) }\n";
 constexpr char property_configuration[] = "attributeTypes:( 7.7 NAME 'setting' SYNTAX " ARC "15 )";
 
 }  // namespace
@@ -106,10 +106,10 @@ TEST(LdcfApi, AFailedStepTellsOneAndTheDebugLog)
 
 TEST(LdcfApi, NamesAreFoundUnderEverySpelling)
 {
-    const active_schema schema(
-        "attributeTypes { ( 2.5.4.3 NAME ( 'cn' 'commonName' ) SYNTAX " ARC "15 ) ( 7.2 NAME 'cert' SYNTAX " ARC "8 )\n"
-        "( 7.3 NAME 'cert;binary' SYNTAX " ARC "15 )\n"
-        "( 7.5 NAME 'x;tag' SYNTAX " ARC "15 ) ( 7.6 NAME 'oid' SYNTAX " ARC "15 ) }");
+    const active_schema schema("attributeTypes { ( 2.5.4.3 NAME ( 'cn' 'commonName' ) SYNTAX " ARC
+                               "15 ) ( 7.2 NAME 'cert' SYNTAX " ARC "8 )\n"
+                               "( 7.3 NAME 'cert;binary' SYNTAX " ARC "15 )\n"
+                               "( 7.5 NAME 'x;tag' SYNTAX " ARC "15 ) ( 7.6 NAME 'oid' SYNTAX " ARC "15 ) }");
     const std::string tag(240, 't');
     struct {
         std::string name;
@@ -244,7 +244,8 @@ TEST(LdcfApi, PredicatesAndListsAnswerByTheirProperties)
     EXPECT_EQ(joined(ldcf_api_get_config_attrs()), "setting");
     EXPECT_EQ(joined(ldcf_api_get_nonencrypted_attrs()), "objectClass cn member plain bin photo operation setting");
     EXPECT_TRUE(ldcf_api_is_encrypted_attr("HASHED") && !ldcf_api_is_encrypted_attr("secured"));
-    EXPECT_TRUE(ldcf_api_is_unique_attr("7.1") && !ldcf_api_is_unique_attr("none") && !ldcf_api_is_unique_attr(nullptr));
+    EXPECT_TRUE(ldcf_api_is_unique_attr("7.1") && !ldcf_api_is_unique_attr("none") &&
+                !ldcf_api_is_unique_attr(nullptr));
     EXPECT_EQ(ldcf_api_schema_contains_encrypted_attributes(), 1);
     EXPECT_EQ(joined(ldcf_api_get_encryptable_attrs()) == joined(ldcf_api_get_nonencryptable_attrs()), false);
     for (const char* syntax : {"5", "8", "9", "10", "23", "28", "40"}) {
@@ -282,7 +283,8 @@ TEST(LdcfApi, DifferencesOfAClassBetweenTheActiveAndTheProposedSchema)
     };
     for (const auto& c : cases) {
         const auto text = [&](const char* objclass) {
-            return std::string(types) + "objectClasses { ( 8.1 NAME 'top' ABSTRACT ) ( 8.2 NAME 'parent' SUP top MUST d )" +
+            return std::string(types) +
+                   "objectClasses { ( 8.1 NAME 'top' ABSTRACT ) ( 8.2 NAME 'parent' SUP top MUST d )" +
                    "( 8.3 NAME 'x' " + objclass + " ) ( 8." + (objclass == c.active ? "4" : "5") + " NAME 'lonely' ) }";
         };
         const active_schema schema(text(c.active).c_str());

@@ -154,9 +154,9 @@ TEST(LdcfRdbmInfo, ProtectionAndIndexesAreTakenOverAndTheBackEndMayAdd)
 {
     Backend rdbm{.be_type = "rdbm", .be_fill_attr_info = hang_on_two};
     ldcf_schema schema;
-    const ldcf_attrtype type = type_of(
-        schema, "NAME 'a' EQUALITY caseIgnoreMatch SYNTAX " ARC "15",
-        "REVERSE ENCRYPT AES-192 SECURE-CONNECTION-REQUIRED RETURN-VALUE type-only NONMATCHABLE", rdbm);
+    const ldcf_attrtype type =
+        type_of(schema, "NAME 'a' EQUALITY caseIgnoreMatch SYNTAX " ARC "15",
+                "REVERSE ENCRYPT AES-192 SECURE-CONNECTION-REQUIRED RETURN-VALUE type-only NONMATCHABLE", rdbm);
     const asyntaxinfo* info = type.info();
     ASSERT_NE(info, nullptr);
     EXPECT_EQ(info->index_action, 1);
@@ -177,7 +177,8 @@ TEST(LdcfRdbmInfo, ProtectionAndIndexesAreTakenOverAndTheBackEndMayAdd)
 TEST(LdcfRdbmInfo, ATypeThatCannotBeStoredHasNoRecord)
 {
     const std::pair<const char*, const char*> cases[] = {
-        {"SYNTAX " ARC "15{32701}", "ldcf_rdbm::fill_asyntaxinfo():attr size 32701 exceed max longvarchar length 32700\n"},
+        {"SYNTAX " ARC "15{32701}",
+         "ldcf_rdbm::fill_asyntaxinfo():attr size 32701 exceed max longvarchar length 32700\n"},
         {"SYNTAX 9.9", "ldcf_rdbm::fill_ayntaxinfo: Invalid syntax: 9.9\n"},
     };
     for (const auto& [definition, told] : cases) {
