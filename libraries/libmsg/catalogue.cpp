@@ -28,6 +28,9 @@ constexpr bool operator<(const catalogue_entry& a, const catalogue_entry& b)
 constexpr catalogue_entry catalogue[] = {
     {MSG_COMPONENT_SERVER, 7, "The server is out of memory."},
     {MSG_COMPONENT_SERVER, 106, "A tree of the server is damaged: %1$s."},
+    {MSG_COMPONENT_SERVER, 168, "The attribute %1$s of an attribute mapping is not defined in the schema."},
+    {MSG_COMPONENT_SERVER, 170, "The attribute name %1$s of an attribute mapping is not well-formed."},
+    {MSG_COMPONENT_SERVER, 171, "The attribute mapping %1$s is not of the form name$name."},
 
     {MSG_COMPONENT_SCHEMA, 1, AT_PLACE "expected %3$s, but could not find it at or before %4$s"},
     {MSG_COMPONENT_SCHEMA, 2, AT_PLACE "expected one of the following: %3$s, but could not find it at or before %4$s"},

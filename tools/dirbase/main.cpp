@@ -55,6 +55,11 @@ constexpr char dn_details[] =
 those on standard input, one a line. Each DN has its answer, in their order.
 )";
 
+constexpr char value_details[] =
+    R"(A text or a DN has its normal form, a number and a boolean their value, a time its instant in UTC. Each value
+has its answer, in their order.
+)";
+
 struct options {
     common_options common;
     std::vector<std::string> files;
@@ -65,6 +70,7 @@ struct options {
     std::string before;
     std::string after;
     std::vector<std::string> dns;
+    std::vector<std::string> values;
     bool light = false;
     std::string operation;
     std::string definition_file;
@@ -273,6 +279,22 @@ void add_dn_group(CLI::App& app, options& given, command& chosen)
     });
 }
 
+void add_value_group(CLI::App& app, options& given, command& chosen)
+{
+    CLI::App* group = app.add_subcommand("value", "Normalise attribute values");
+    add_flags_of_all(*group);
+    expect_subcommand(*group);
+    CLI::App* normalize =
+        add_command(*group, "normalize", "Print what values are held and compared as", value_details, given.common);
+    normalize->add_option("SYNTAX", given.property, "An attribute type by name or OID, or the OID of a syntax")
+        ->type_name("")
+        ->required();
+    normalize->add_option("VALUE", given.values, "Values")->type_name("")->required();
+    normalize->callback([&given, &chosen] {
+        chosen = [&given](message_collector&) { return normalize_values(given.common, given.property, given.values); };
+    });
+}
+
 // Tells a failure, to the eyes and with --json to programs, and gives its exit status.
 int report(const tool_failure& failure, bool as_json)
 {
@@ -342,6 +364,7 @@ int main_of_tool(int argc, char** argv)
     add_diff(*schema, given, chosen);
     add_modify(*schema, given, chosen);
     add_dn_group(app, given, chosen);
+    add_value_group(app, given, chosen);
 
     try {
         app.parse(argc, argv);

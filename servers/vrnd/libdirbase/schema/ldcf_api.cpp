@@ -9,6 +9,7 @@
 #include "libraries/libvrnutil/vrn_text.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
+#include "servers/vrnd/libdirbase/model/language_tag.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_hash_index.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_rdbm.h"
 
@@ -17,8 +18,6 @@ std::int32_t ldcf_api_schema_check_g = 2;
 Entry* ldcf_api_schema_entry_g = nullptr;
 
 namespace {
-
-constexpr std::size_t longest_tag = 240;
 
 constexpr char binary_suffix[] = ";binary";
 constexpr std::size_t binary_suffix_length = sizeof(binary_suffix) - 1;
@@ -66,21 +65,6 @@ heap_text without_binary(const char* name, std::size_t length)
     return info != nullptr && info->syntax == SC_BIN ? info : nullptr;
 }
 
-// The name in front of language tags: null in `base` when there are none. False when a tag is too long or memory ran
-// out. Whether the tags are language tags is not looked at.
-bool split_language_tags(const char* name, heap_text& base)
-{
-    const char* tags = std::strchr(name, ';');
-    if (tags == nullptr || vrn_strcasecmp(tags, binary_suffix) == 0) {
-        return true;
-    }
-    if (std::strlen(tags + 1) > longest_tag) {
-        return false;
-    }
-    base.reset(strndup(name, static_cast<std::size_t>(tags - name)));
-    return base != nullptr;
-}
-
 // Looks a name up in a map; a handle is never made for it, so that readers don't meet in its counter.
 template <typename T>
 const T* find(const ldcf_map_name_to<T>& map, const char* name)
@@ -92,12 +76,13 @@ const T* find(const ldcf_map_name_to<T>& map, const char* name)
 // What the cache doesn't hold. Kept apart from the common look-up, which is a few steps without it.
 [[gnu::noinline]] asyntaxinfo* uncached_info(const char* name, char** base_out)
 {
-    heap_text base;
-    const bool split = split_language_tags(name, base);
+    char* parsed = nullptr;
+    const int result = parse_language_tags(name, &parsed, nullptr, LANGUAGE_BASE);
+    heap_text base(parsed);
     if (base_out != nullptr) {
         *base_out = nullptr;
     }
-    if (!split) {
+    if (result != LDAP_SUCCESS) {
         debug_error("ldcf_api_attr_get_info(): parse_language_tags() failed.\n");
         return nullptr;
     }

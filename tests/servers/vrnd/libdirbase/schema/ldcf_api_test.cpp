@@ -127,7 +127,7 @@ TEST(LdcfApi, NamesAreFoundUnderEverySpelling)
         {"oid", "7.6", "(untouched)", "7.6"},
         {"none", nullptr, nullptr, nullptr},
         {"cn;lang-en", "2.5.4.3", "cn", nullptr},
-        {"oid.commonName;a;b", "2.5.4.3", "commonName", nullptr},
+        {"oid.commonName;a;b", nullptr, "commonName;a", nullptr},  // the last one is the tag
         {"none;lang-en", nullptr, "none", nullptr},
         {";", nullptr, "", nullptr},
         {"x;TAG", "7.5", "(untouched)", "7.5"},

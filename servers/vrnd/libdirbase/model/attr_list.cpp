@@ -1,0 +1,347 @@
+// The records of an entry on their two lists: making, finding, walking and removing them (attribute.h).
+//
+// In the sorted list a record stands by its key: the schema's first name where it is known, else the name as stored. So
+// all versions of a known attribute stand side by side, and a walk that looks for one can't pass it by.
+#include <cstddef>
+#include <cstdlib>
+#include <cstring>
+#include <utility>
+
+#include "libraries/libber/ldap_result.h"
+#include "libraries/libmsg/debug_log.h"
+#include "libraries/libvrnutil/vrn_text.h"
+#include "servers/vrnd/libdirbase/base/syntax_codes.h"
+#include "servers/vrnd/libdirbase/model/attr_ids.h"
+#include "servers/vrnd/libdirbase/model/attr_value_tree.h"
+#include "servers/vrnd/libdirbase/model/attribute.h"
+#include "servers/vrnd/libdirbase/model/language_tag.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_api.h"
+
+namespace {
+
+int first_letter(const char* name)
+{
+    return *name >= 'A' && *name <= 'Z' ? *name - 'A' + 'a' : static_cast<unsigned char>(*name);
+}
+
+const char* key_of(const asyntaxinfo* info, const char* name)
+{
+    return info != nullptr ? info->names[0] : name;
+}
+
+bool has_tag(const char* tag)
+{
+    return tag != nullptr && *tag != '\0';
+}
+
+bool is_tagged(const Attribute& attr)
+{
+    return has_tag(find_language_tag(attr.a_type));
+}
+
+bool is_version(const Attribute& attr, const asyntaxinfo* info, const char* tag)
+{
+    return attr.a_info == info && strtagcmp(find_language_tag(attr.a_type), tag) == 0;
+}
+
+// The entry's slot for an attribute, where it has one for this version; else null.
+Attribute** slot_of(Entry& entry, const asyntaxinfo* info, bool tagged)
+{
+    if (info == nullptr) {
+        return nullptr;
+    }
+    switch (info->attr_id) {
+    case attr_id_objectclass: return &entry.e_objectclass_attr;
+    case attr_id_member: return &entry.e_member_attr;
+    case attr_id_uniquemember: return &entry.e_uniquemember_attr;
+    case attr_id_allmembers: return &entry.e_allmembers_attr;
+    case attr_id_ref: return tagged ? nullptr : &entry.e_ref_attr;
+    default: return nullptr;
+    }
+}
+
+// The first record at or behind `at` that belongs to a known attribute, whatever its tag.
+Attribute* next_of(Attribute* at, const asyntaxinfo* info)
+{
+    while (at != nullptr && at->a_info != info) {
+        at = at->a_next;
+    }
+    return info == nullptr ? nullptr : at;
+}
+
+// Where a version stands: its record, or else the two between which it belongs, either of them null at an end.
+struct sorted_place {
+    Attribute* found;
+    Attribute* below;
+    Attribute* above;
+};
+
+// Walks down from the largest name. Names are compared as a whole only within one first letter.
+sorted_place find_place(const Entry& entry, const asyntaxinfo* info, const char* name, const char* tag)
+{
+    const char* const key = key_of(info, name);
+    const int letter = first_letter(key);
+    Attribute* above = nullptr;
+    Attribute* at = entry.e_sorted_high;
+    for (; at != nullptr; above = std::exchange(at, at->a_sorted_prev)) {
+        if (info != nullptr && at->a_info == info) {
+            if (strtagcmp(find_language_tag(at->a_type), tag) == 0) {
+                return {at, nullptr, nullptr};
+            }
+            continue;
+        }
+        const char* const other = key_of(at->a_info, at->a_type);
+        const int other_letter = first_letter(other);
+        const int order = other_letter != letter ? other_letter - letter : vrn_strcasecmp(other, key);
+        // Equal keys of unlike records: the schema has come to know, or to lose, the attribute in between.
+        const bool both_unknown = info == nullptr && at->a_info == nullptr;
+        if (order == 0 && (both_unknown || strtagcmp(find_language_tag(at->a_type), tag) == 0)) {
+            return {at, nullptr, nullptr};
+        }
+        if (order < 0) {
+            break;
+        }
+    }
+    return {nullptr, at, above};
+}
+
+Attribute* new_attribute(const char* name, asyntaxinfo* info)
+{
+    const std::size_t size = std::strlen(name) + 1;
+    auto* attr = static_cast<Attribute*>(std::calloc(1, sizeof(Attribute) + size));
+    if (attr != nullptr) {
+        attr->a_type = static_cast<char*>(std::memcpy(attr + 1, name, size));
+        attr->a_syntax = static_cast<std::int32_t>(info == nullptr ? SC_CIS : info->syntax);
+        attr->a_info = info;
+    }
+    return attr;
+}
+
+void link_attribute(Entry& entry, Attribute& attr, const sorted_place& place)
+{
+    attr.a_sorted_prev = place.below;
+    attr.a_sorted_next = place.above;
+    (place.below == nullptr ? entry.e_sorted_low : place.below->a_sorted_next) = &attr;
+    (place.above == nullptr ? entry.e_sorted_high : place.above->a_sorted_prev) = &attr;
+    attr.a_prev = entry.e_attrs_tail;
+    (entry.e_attrs_tail == nullptr ? entry.e_attrs : entry.e_attrs_tail->a_next) = &attr;
+    entry.e_attrs_tail = &attr;
+}
+
+void unlink_attribute(Entry& entry, Attribute& attr)
+{
+    (attr.a_sorted_prev == nullptr ? entry.e_sorted_low : attr.a_sorted_prev->a_sorted_next) = attr.a_sorted_next;
+    (attr.a_sorted_next == nullptr ? entry.e_sorted_high : attr.a_sorted_next->a_sorted_prev) = attr.a_sorted_prev;
+    (attr.a_prev == nullptr ? entry.e_attrs : attr.a_prev->a_next) = attr.a_next;
+    (attr.a_next == nullptr ? entry.e_attrs_tail : attr.a_next->a_prev) = attr.a_prev;
+}
+
+// The slot of a new record: a version without a tag takes it over from one with a tag.
+void fill_slot(Entry& entry, Attribute& attr)
+{
+    const bool tagged = is_tagged(attr);
+    Attribute** const slot = slot_of(entry, attr.a_info, tagged);
+    if (slot != nullptr && (*slot == nullptr || !tagged)) {
+        *slot = &attr;
+    }
+}
+
+// The slot of a record that is no longer on the lists: a version that is left moves up, or else it is cleared.
+void clear_slot(Entry& entry, const Attribute& attr)
+{
+    Attribute** const slot = slot_of(entry, attr.a_info, is_tagged(attr));
+    if (slot != nullptr && *slot == &attr) {
+        *slot = attr.a_info->attr_id == attr_id_ref ? nullptr : next_of(entry.e_attrs, attr.a_info);
+    }
+}
+
+// The record that a name stands for. LDAP_INVALID_SYNTAX for a tag that is too long, which keeps nobody from a slot.
+int find_by_name(const Entry& entry, const char* name, const asyntaxinfo* info, Attribute** attr)
+{
+    const char* const tag = find_language_tag(name);
+    const bool too_long = tag != nullptr && std::strlen(tag) > longest_language_tag;
+    Attribute* const* const slot = slot_of(const_cast<Entry&>(entry), info, has_tag(tag));
+    if (slot != nullptr) {
+        *attr = *slot;
+        return too_long && info->attr_id != attr_id_objectclass ? LDAP_INVALID_SYNTAX : LDAP_SUCCESS;
+    }
+    *attr = too_long ? nullptr : flatattr_find(&entry, info, tag);
+    return too_long ? LDAP_INVALID_SYNTAX : LDAP_SUCCESS;
+}
+
+// How a walk over versions has begun.
+enum walk_state : int {
+    walk_not_started = 0,
+    walk_in_order = 1,        // every version from the previous one on
+    walk_untagged_first = 2,  // the version without a tag is out of its turn: all others follow
+};
+
+}  // namespace
+
+extern "C" {
+
+// ---- making and finding ---------------------------------------------------------------------------------------------
+
+int flatattr_insert(Entry* entry, asyntaxinfo* info, const char* name, Attribute** attr, const char* tag)
+{
+    if (entry == nullptr || attr == nullptr || name == nullptr) {
+        return LDAP_OTHER;
+    }
+    const sorted_place place = find_place(*entry, info, name, tag);
+    *attr = place.found != nullptr ? place.found : new_attribute(name, info);
+    if (*attr == nullptr) {
+        debug_error("Error - flatattr_insert: malloc() failed. Out of memory\n");
+        return LDAP_NO_MEMORY;
+    }
+    if (place.found == nullptr) {
+        link_attribute(*entry, **attr, place);
+        fill_slot(*entry, **attr);
+    }
+    return LDAP_SUCCESS;
+}
+
+Attribute* flatattr_find(const Entry* entry, const asyntaxinfo* info, const char* tag)
+{
+    if (entry == nullptr || info == nullptr) {
+        return nullptr;
+    }
+    Attribute* attr = entry->e_attrs;
+    while (attr != nullptr && !is_version(*attr, info, tag)) {
+        attr = attr->a_next;
+    }
+    return attr;
+}
+
+Attribute* attr_find(const Entry* entry, const char* name, int /*ignored*/, asyntaxinfo* info)
+{
+    if (entry == nullptr || name == nullptr) {
+        return nullptr;
+    }
+    if (info == nullptr) {
+        info = ldcf_api_attr_get_info(name, nullptr);
+    }
+    Attribute* attr = nullptr;
+    find_by_name(*entry, name, info, &attr);
+    return attr;
+}
+
+int attr_find_attr_or_lang_tag_version(const Entry* entry, const char* name, int* started, int* tag_state,
+                                       asyntaxinfo** info, Attribute** attr)
+{
+    if (entry == nullptr || name == nullptr || started == nullptr || tag_state == nullptr || info == nullptr ||
+        attr == nullptr) {
+        return 1;
+    }
+    if (*info == nullptr) {
+        *info = ldcf_api_attr_get_info(name, nullptr);
+    }
+    *attr = attr_find(entry, name, 0, *info);
+    if (*attr == nullptr) {
+        *tag_state = contains_valid_language_tag(name) ? 1 : 0;
+        *attr = *tag_state == 1 ? nullptr : next_of(entry->e_attrs, *info);
+    }
+    if (*attr != nullptr) {
+        const bool in_order = is_tagged(**attr) || *attr == next_of(entry->e_attrs, *info);
+        *started = in_order ? walk_in_order : walk_untagged_first;
+    }
+    return 0;
+}
+
+int attr_find_next_attr_match(const Entry* entry, const char* name, int* started, int* tag_state, asyntaxinfo* info,
+                              Attribute** attr)
+{
+    if (entry == nullptr || name == nullptr || started == nullptr || tag_state == nullptr || attr == nullptr) {
+        return 1;
+    }
+    if (*tag_state == -1) {
+        *tag_state = contains_valid_language_tag(name) ? 1 : 0;
+    }
+    Attribute* const previous = *attr;
+    *attr = nullptr;
+    if (*tag_state != 0 || (*started != walk_not_started && previous == nullptr)) {
+        return 0;
+    }
+    if (*started == walk_not_started) {
+        *started = walk_in_order;
+        *attr = next_of(entry->e_attrs, info);
+    } else if (*started == walk_in_order) {
+        *attr = next_of(previous->a_next, info);
+    } else {
+        *attr = next_of(is_tagged(*previous) ? previous->a_next : entry->e_attrs, info);
+        if (*attr != nullptr && !is_tagged(**attr)) {
+            *attr = next_of((*attr)->a_next, info);
+        }
+    }
+    return 0;
+}
+
+int flatattr_apply(Entry* entry, flatattr_function function, void* argument)
+{
+    for (Attribute* attr = entry == nullptr ? nullptr : entry->e_sorted_low; attr != nullptr;) {
+        Attribute* const next = attr->a_sorted_next;
+        if (function(attr, argument) != 0) {
+            return 1;
+        }
+        attr = next;
+    }
+    return AVL_NOMORE;
+}
+
+// ---- removing -------------------------------------------------------------------------------------------------------
+
+int attr_delete(Entry* entry, const char* name, asyntaxinfo* info)
+{
+    if (entry == nullptr || entry->e_attrs == nullptr) {
+        return -1;
+    }
+    if (name == nullptr) {
+        return 1;
+    }
+    if (info == nullptr) {
+        info = ldcf_api_attr_get_info(name, nullptr);
+    }
+    Attribute* attr = nullptr;
+    const int result = find_by_name(*entry, name, info, &attr);
+    if (result != LDAP_SUCCESS) {
+        return result;
+    }
+    if (attr == nullptr) {
+        return 1;
+    }
+    if (info->attr_id == attr_id_member) {
+        entry->e_member_count = 0;
+    } else if (info->attr_id == attr_id_uniquemember) {
+        entry->e_uniquemember_count = 0;
+    }
+    unlink_attribute(*entry, *attr);
+    clear_slot(*entry, *attr);
+    attr_free(attr);
+    return 0;
+}
+
+void attr_free(Attribute* attr)
+{
+    if (attr != nullptr) {
+        ber_bvecfree(attr->a_vals);
+        attr_free_normvals(attr);
+        attr_free_decodedvals(attr);
+    }
+    std::free(attr);
+}
+
+void attr_free_normvals(Attribute* attr)
+{
+    if (attr != nullptr) {
+        avl_free(std::exchange(attr->a_tree, nullptr),
+                 [](void* node) { free_AttrvalsNorm(static_cast<AttrvalsNorm*>(node)); });
+    }
+}
+
+void attr_free_decodedvals(Attribute* attr)
+{
+    if (attr != nullptr) {
+        ber_bvecfree(std::exchange(attr->a_decoded, nullptr));
+    }
+}
+
+}  // extern "C"

@@ -1,0 +1,42 @@
+// The entry: a DN, its normal form, and the attributes, each of them a record on two lists (attribute.h).
+#pragma once
+
+#include <cstdint>
+
+#include "libraries/libber/berval.h"
+
+struct Attribute;
+
+// Bits of e_flag.
+constexpr std::uint8_t ENTRY_IN_CACHE = 0x01;              // the entry belongs to a cache, which alone may release it
+constexpr std::uint8_t ENTRY_MEMBER_TRIMMED = 0x02;        // the text that it was read from had `member` lines, trimmed
+constexpr std::uint8_t ENTRY_UNIQUEMEMBER_TRIMMED = 0x04;  // the same for `uniquemember`
+
+// All pointers are owned by the entry and come from malloc, but for the slots and the back end's word. A new entry is
+// zeroed.
+struct Entry {
+    char* e_dn;          // as given
+    Attribute* e_attrs;  // in order of arrival: the first
+    std::int32_t e_id;   // 0 when none was given
+    std::uint8_t e_flag;
+    Attribute* e_sorted_low;       // in order of names: the smallest
+    Attribute* e_sorted_high;      // and the largest
+    Attribute* e_attrs_tail;       // in order of arrival: the last
+    char* e_norm_dn;               // the upper text of dn_normalize_esc for e_dn
+    void* e_backend_word;          // the back end's own; a copy of the entry takes the same pointer
+    char* e_checksum;              // value of xan-entryCheckSum as the back end holds it
+    char* e_checksumop;            // value of xan-entryCheckSumOp as the back end holds it
+    berval** e_backend_values[4];  // filled by the back ends
+
+    // Direct slots: the record of an attribute that nearly every operation asks for, or null. Of `ref` the version
+    // without a language tag, of the others that version as long as there is one.
+    Attribute* e_objectclass_attr;
+    Attribute* e_ref_attr;
+    Attribute* e_member_attr;
+    Attribute* e_uniquemember_attr;
+    Attribute* e_allmembers_attr;
+
+    // Numbers of values as the back end knows them: -1 after values were merged, 0 after the attribute was deleted.
+    std::int64_t e_member_count;
+    std::int64_t e_uniquemember_count;
+};
