@@ -22,12 +22,6 @@ struct alignas(64) wide {
     char bytes[64];
 };
 
-// An allocation that the compiler can't leave out.
-void allocate()
-{
-    ::operator delete(::operator new(1));
-}
-
 // Three allocations: inside libstdc++.so, aligned, and one that reports by null.
 void allocate_three_times()
 {
@@ -64,12 +58,10 @@ TEST(AllocFault, EachAllocationFailsOnceAndTheLastRunIsWhole)
 
 TEST(AllocFault, OtherThreadsAndPausesAndExceptionsInFlightAreLeftAlone)
 {
-    std::atomic<bool> done = false;
     std::atomic<unsigned> rounds = 0;
-    std::thread other([&] {
-        while (!done) {
+    const std::jthread other([&rounds](const std::stop_token& stop) {
+        for (; !stop.stop_requested(); ++rounds) {
             allocate_three_times();
-            ++rounds;
         }
     });
     const std::size_t points = for_each_failing_allocation([&](std::size_t) {
@@ -84,10 +76,8 @@ TEST(AllocFault, OtherThreadsAndPausesAndExceptionsInFlightAreLeftAlone)
             throw 1;
         } catch (int) {
         }
-        allocate();
+        ::operator delete(::operator new(1));
     });
-    done = true;
-    other.join();
     EXPECT_EQ(points, 1u);
 }
 
@@ -97,7 +87,7 @@ TEST(AllocFault, ABlockLeftBehindIsATestFailure)
     EXPECT_NONFATAL_FAILURE(for_each_failing_allocation([](std::size_t) {
                                 void* block = ::operator new(1);
                                 try {
-                                    allocate();
+                                    ::operator delete(::operator new(1));
                                 } catch (const std::bad_alloc&) {
                                     leaked = block;
                                     throw;

@@ -1,10 +1,7 @@
-// The catchers. Their sinks are called by code that may be running out of memory on purpose: what arrives then is kept
-// without its texts, in room reserved before.
+// The catchers. Their sinks are called by code that may be running out of memory on purpose.
 #include "tests/support/message_catcher.h"
 
 #include <algorithm>
-#include <new>
-#include <utility>
 
 #include "libraries/libmsg/message_format.h"
 
@@ -12,67 +9,35 @@ namespace test_support {
 
 namespace {
 
-constexpr std::size_t reserved = 256;
-
 std::string printed(const message_argument& argument)
 {
-    bounded_text measure(nullptr, 0);
-    put_argument(measure, argument);
-    std::string text(measure.finish(), '\0');
-
-    bounded_text out(text.data(), text.size() + 1);
+    if (argument.type == message_argument::kind::text) {
+        return argument.text == nullptr ? "" : argument.text;
+    }
+    char number[40];
+    bounded_text out(number, sizeof number);
     put_argument(out, argument);
     out.finish();
-    return text;
+    return number;
 }
 
 }  // namespace
 
-message_catcher::message_catcher()
-{
-    caught_.reserve(reserved);
-    set_message_sink(&message_catcher::receive, this);
-}
-
-message_catcher::~message_catcher()
-{
-    set_message_sink(nullptr, nullptr);
-}
-
 void message_catcher::receive(void* context, const message_record& record)
 {
-    caught_message caught;
-    caught.component = record.component;
-    caught.severity = record.severity;
-    caught.id = record.id;
-    try {
-        for (std::size_t i = 0; i < record.argument_count; ++i)
-            caught.arguments.push_back(printed(record.arguments[i]));
-        caught.text = record.text;
-        caught.line = record.line;
-    } catch (const std::bad_alloc&) {
-        caught.complete = false;
-    }
-
-    auto* self = static_cast<message_catcher*>(context);
-    const std::lock_guard<std::mutex> lock(self->mutex_);
-    try {
-        self->caught_.push_back(std::move(caught));
-    } catch (const std::bad_alloc&) {
-        ++self->lost_;  // more than were reserved
-    }
-}
-
-std::vector<caught_message> message_catcher::messages() const
-{
-    const std::lock_guard<std::mutex> lock(mutex_);
-    return caught_;
-}
-
-std::size_t message_catcher::count() const
-{
-    const std::lock_guard<std::mutex> lock(mutex_);
-    return caught_.size() + lost_;
+    static_cast<message_catcher*>(context)->add([&record] {
+        caught_message caught = {record.component, record.severity, record.id, {}, {}, {}};
+        try {
+            for (std::size_t i = 0; i < record.argument_count; ++i) {
+                caught.arguments.push_back(printed(record.arguments[i]));
+            }
+            caught.text = record.text;
+            caught.line = record.line;
+        } catch (const std::bad_alloc&) {
+            // Counted all the same.
+        }
+        return caught;
+    });
 }
 
 std::size_t message_catcher::count(int component, int id) const
@@ -82,13 +47,6 @@ std::size_t message_catcher::count(int component, int id) const
         return message.component == component && message.id == id;
     });
     return static_cast<std::size_t>(hits);
-}
-
-void message_catcher::clear()
-{
-    const std::lock_guard<std::mutex> lock(mutex_);
-    caught_.clear();
-    lost_ = 0;
 }
 
 debug_catcher::debug_catcher(unsigned level) : level_before_(read_ldap_debug())
@@ -105,45 +63,13 @@ debug_catcher::~debug_catcher()
 
 void debug_catcher::receive(void* context, unsigned /*level*/, const char* text)
 {
-    auto* self = static_cast<debug_catcher*>(context);
-    const std::lock_guard<std::mutex> lock(self->mutex_);
-    try {
-        self->caught_.emplace_back(text);
-    } catch (const std::bad_alloc&) {
-        ++self->lost_;
-    }
-}
-
-std::vector<std::string> debug_catcher::texts() const
-{
-    const std::lock_guard<std::mutex> lock(mutex_);
-    return caught_;
-}
-
-std::size_t debug_catcher::count() const
-{
-    const std::lock_guard<std::mutex> lock(mutex_);
-    return caught_.size() + lost_;
+    static_cast<debug_catcher*>(context)->add([text] { return std::string(text); });
 }
 
 bool debug_catcher::has(std::string_view text) const
 {
     const std::lock_guard<std::mutex> lock(mutex_);
     return std::find(caught_.begin(), caught_.end(), text) != caught_.end();
-}
-
-bool debug_catcher::has_part(std::string_view part) const
-{
-    const std::lock_guard<std::mutex> lock(mutex_);
-    return std::any_of(caught_.begin(), caught_.end(),
-                       [&](const std::string& text) { return text.find(part) != std::string::npos; });
-}
-
-void debug_catcher::clear()
-{
-    const std::lock_guard<std::mutex> lock(mutex_);
-    caught_.clear();
-    lost_ = 0;
 }
 
 }  // namespace test_support

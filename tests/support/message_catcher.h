@@ -10,6 +10,7 @@
 
 #include <cstddef>
 #include <mutex>
+#include <new>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -26,61 +27,85 @@ struct caught_message {
     std::vector<std::string> arguments;  // as they print: a null text is empty
     std::string text;                    // what the catalogue made of it
     std::string line;                    // the log line without its line feed
-    bool complete = true;                // false when memory for the texts above was lacking
 };
 
-// Installs a message sink for its lifetime; messages go to standard error again afterwards.
-class message_catcher {
+// What was caught, in order of arrival.
+template <typename Entry>
+class catcher {
 public:
-    message_catcher();
-    ~message_catcher();
-    message_catcher(const message_catcher&) = delete;
-    message_catcher& operator=(const message_catcher&) = delete;
+    catcher() { caught_.reserve(256); }
+    catcher(const catcher&) = delete;
+    catcher& operator=(const catcher&) = delete;
 
-    // Everything caught so far, in order of arrival; without what there was no memory at all for.
-    std::vector<caught_message> messages() const;
+    // How many came, with those that there was no memory at all for.
+    std::size_t count() const
+    {
+        const std::lock_guard<std::mutex> lock(mutex_);
+        return caught_.size() + lost_;
+    }
 
-    // How many messages came, of all kinds or of one.
-    std::size_t count() const;
+    void clear()
+    {
+        const std::lock_guard<std::mutex> lock(mutex_);
+        caught_.clear();
+        lost_ = 0;
+    }
+
+protected:
+    // Calls make(), which may run out of memory, for what is kept.
+    template <typename Make>
+    void add(const Make& make)
+    {
+        const std::lock_guard<std::mutex> lock(mutex_);
+        try {
+            caught_.push_back(make());
+        } catch (const std::bad_alloc&) {
+            ++lost_;
+        }
+    }
+
+    std::vector<Entry> all() const
+    {
+        const std::lock_guard<std::mutex> lock(mutex_);
+        return caught_;
+    }
+
+    mutable std::mutex mutex_;
+    std::vector<Entry> caught_;
+    std::size_t lost_ = 0;
+};
+
+// Installs a message sink for its lifetime; messages go to standard error again afterwards. A message that comes while
+// memory is lacking is kept without its texts.
+class message_catcher : public catcher<caught_message> {
+public:
+    message_catcher() { set_message_sink(&message_catcher::receive, this); }
+    ~message_catcher() { set_message_sink(nullptr, nullptr); }
+
+    std::vector<caught_message> messages() const { return all(); }
+
+    using catcher::count;
     std::size_t count(int component, int id) const;
-
-    void clear();
 
 private:
     static void receive(void* context, const message_record& record);
-
-    mutable std::mutex mutex_;
-    std::vector<caught_message> caught_;
-    std::size_t lost_ = 0;
 };
 
 // Installs a debug sink and a level for its lifetime; afterwards debug texts go to standard error again, by the level
 // that was set before.
-class debug_catcher {
+class debug_catcher : public catcher<std::string> {
 public:
     explicit debug_catcher(unsigned level = LDAP_DEBUG_ERROR);
     ~debug_catcher();
-    debug_catcher(const debug_catcher&) = delete;
-    debug_catcher& operator=(const debug_catcher&) = delete;
 
-    // The texts caught so far, in order of arrival, with their line feeds; without what memory was lacking for.
-    std::vector<std::string> texts() const;
+    // The texts with their line feeds; without what memory was lacking for.
+    std::vector<std::string> texts() const { return all(); }
 
-    // How many texts came.
-    std::size_t count() const;
-
-    // Whether one of the texts is, or holds, this one.
     bool has(std::string_view text) const;
-    bool has_part(std::string_view part) const;
-
-    void clear();
 
 private:
     static void receive(void* context, unsigned level, const char* text);
 
-    mutable std::mutex mutex_;
-    std::vector<std::string> caught_;
-    std::size_t lost_ = 0;
     unsigned level_before_;
 };
 

@@ -6,14 +6,15 @@
 #include <filesystem>
 #include <fstream>
 #include <iterator>
+#include <stdexcept>
 #include <string>
 #include <string_view>
 #include <system_error>
 
 namespace test_support {
 
-// Every failure is raised as std::filesystem::filesystem_error, which fails the test that asked. Not to be shared
-// between threads; two objects never share a folder, in one process or in several.
+// Every failure is raised as an exception, which fails the test that asked. Not to be shared between threads; two
+// objects never share a folder, in one process or in several.
 class temp_dir {
 public:
     // Makes a new folder, readable by its owner only, below TMPDIR or else /tmp.
@@ -21,7 +22,7 @@ public:
     {
         std::string name = (std::filesystem::temp_directory_path() / "dirbase-test-XXXXXX").string();
         if (mkdtemp(name.data()) == nullptr) {
-            fail("mkdtemp", name, errno);
+            throw std::system_error(errno, std::generic_category(), name);
         }
         path_ = name;
     }
@@ -47,31 +48,22 @@ public:
         const std::filesystem::path file = path_ / name;
         std::filesystem::create_directories(file.parent_path());
         std::ofstream out(file, std::ios::binary | std::ios::trunc);
-        out.write(text.data(), static_cast<std::streamsize>(text.size()));
-        out.close();
-        if (!out) {
-            fail("write", file, EIO);
-        }
+        out.exceptions(std::ios::failbit | std::ios::badbit);
+        out << text << std::flush;
         return file.string();
     }
 
     // The whole content of the file `name`.
     std::string read(std::string_view name) const
     {
-        const std::filesystem::path file = path_ / name;
-        std::ifstream in(file, std::ios::binary);
+        std::ifstream in(path_ / name, std::ios::binary);
         if (!in) {
-            fail("open", file, ENOENT);
+            throw std::runtime_error("can't read " + path(name));
         }
         return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
     }
 
 private:
-    [[noreturn]] static void fail(const char* what, const std::filesystem::path& file, int error)
-    {
-        throw std::filesystem::filesystem_error(what, file, std::error_code(error, std::generic_category()));
-    }
-
     std::filesystem::path path_;
 };
 

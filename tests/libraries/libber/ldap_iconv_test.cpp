@@ -12,15 +12,13 @@ namespace {
 
 TEST(LdapIconv, AConversionThatIsNotKnownHasADescriptorThatTellsSo)
 {
-    const char* const pairs[][2] = {
-        {"UTF-8", "NO-SUCH-PAGE"}, {"NO-SUCH-PAGE", "UTF-8"}, {nullptr, "UTF-8"}, {"UTF-8", nullptr}};
+    const char* const pairs[][2] = {{"UTF-8", "NO-SUCH-PAGE"}, {"UTF-8", nullptr}, {nullptr, "UTF-8"}};
     for (const auto& [to, from] : pairs) {
         errno = 0;
         ldap_iconv_t* conversion = ldap_iconv_open(to, from);
         EXPECT_EQ(errno, EINVAL);
         ASSERT_NE(conversion, nullptr);
         EXPECT_EQ(conversion->descriptor, reinterpret_cast<iconv_t>(-1));
-
         EXPECT_EQ(ldap_iconv(conversion, nullptr, nullptr, nullptr, nullptr), -1);
         EXPECT_EQ(errno, EBADF);
         EXPECT_EQ(ldap_iconv_close(conversion), 0);
@@ -31,23 +29,21 @@ TEST(LdapIconv, AConversionThatIsNotKnownHasADescriptorThatTellsSo)
 
 TEST(LdapIconv, AFailureLeavesThePositionsAtThePlace)
 {
-    struct failure {
+    const struct {
         const char* input;
-        std::size_t room;
         int error;
         std::size_t in_left;
         const char* output;
+    } table[] = {
+        {"a\xFFz", EILSEQ, 2, "a"},      // no UTF-8
+        {"ab\u20ACz", EILSEQ, 4, "ab"},  // not in the target
+        {"abc\xC3", EINVAL, 1, "abc"},   // cut
+        {"abcd", E2BIG, 1, "abc"},       // no room
     };
-    const failure table[] = {
-        {"a\xFFz", 10, EILSEQ, 2, "a"},      // no UTF-8
-        {"ab\u20ACz", 10, EILSEQ, 4, "ab"},  // not in the target
-        {"abc\xC3", 10, EINVAL, 1, "abc"},   // cut
-        {"abcd", 3, E2BIG, 1, "abc"},        // no room
-    };
-    for (const failure& row : table) {
+    for (const auto& row : table) {
         ldap_iconv_t* conversion = ldap_iconv_open("ISO-8859-1", "UTF-8");
         std::string input = row.input;
-        std::string output(row.room, '\0');
+        std::string output(3, '\0');
         char* in = input.data();
         char* out = output.data();
         std::size_t in_left = input.size();
@@ -55,7 +51,7 @@ TEST(LdapIconv, AFailureLeavesThePositionsAtThePlace)
         EXPECT_EQ(ldap_iconv(conversion, &in, &in_left, &out, &out_left), -1) << row.input;
         EXPECT_EQ(errno, row.error) << row.input;
         EXPECT_EQ(in_left, row.in_left) << row.input;
-        EXPECT_EQ(output.substr(0, output.size() - out_left), row.output) << row.input;
+        EXPECT_EQ(output.substr(0, 3 - out_left), row.output) << row.input;
         EXPECT_EQ(ldap_iconv_close(conversion), 0);
     }
 }

@@ -1,52 +1,44 @@
 // The portable text helpers, beside slow and obvious equivalents.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdlib>
-#include <cstring>
 #include <cwchar>
 #include <string>
-#include <vector>
 
 #include "libraries/libvrnutil/vrn_text.h"
 
 namespace {
 
-TEST(VrnText, CopyingFillsAnyBufferExactlyAndTellsTheWholeLength)
-{
-    for (const std::string from : {"", "a", "abc", "abcdefgh"}) {
-        for (std::size_t size = 0; size <= 10; ++size) {
-            std::vector<char> buffer(size + 1, '#');
-            EXPECT_EQ(vrn_strlcpy(buffer.data(), from.c_str(), size), from.size());
-            EXPECT_EQ(buffer[size], '#') << "written behind the buffer";
-            if (size > 0) {
-                EXPECT_EQ(std::string(buffer.data()), from.substr(0, size - 1));
-            }
-        }
-    }
-}
-
-TEST(VrnText, AppendingFillsAnyBufferExactlyAndTellsTheWholeLength)
+TEST(VrnText, CopyingAndAppendingFillAnyBufferExactlyAndTellTheWholeLength)
 {
     for (const std::string first : {"", "abc"}) {
-        for (const std::string more : {"", "de", "defghij"}) {
-            for (std::size_t size = first.size() + 1; size <= 12; ++size) {
-                std::vector<char> buffer(size + 1, '#');
-                std::strcpy(buffer.data(), first.c_str());
-                EXPECT_EQ(vrn_strlcat(buffer.data(), more.c_str(), size), first.size() + more.size());
+        for (const std::string more : {"", "a", "defghij"}) {
+            for (std::size_t size = 0; size <= 12; ++size) {
+                SCOPED_TRACE(first + " and " + more + " into " + std::to_string(size));
+                std::string buffer(size + 1, '#');
+                EXPECT_EQ(vrn_strlcpy(buffer.data(), more.c_str(), size), more.size());
                 EXPECT_EQ(buffer[size], '#') << "written behind the buffer";
-                EXPECT_EQ(std::string(buffer.data()), (first + more).substr(0, size - 1));
+                if (size > 0) {
+                    EXPECT_EQ(buffer.c_str(), more.substr(0, size - 1));
+                }
+                buffer = first + std::string(size + 1, '#');  // without a terminator as long as it doesn't fit
+                buffer.resize(size + 1);
+                if (first.size() < size) {
+                    buffer[first.size()] = '\0';
+                }
+                const std::string before = buffer;
+                EXPECT_EQ(vrn_strlcat(buffer.data(), more.c_str(), size), std::min(first.size(), size) + more.size());
+                EXPECT_EQ(buffer[size], before[size]) << "written behind the buffer";
+                if (first.size() < size) {
+                    EXPECT_EQ(buffer.c_str(), (first + more).substr(0, size - 1));
+                } else {
+                    EXPECT_EQ(buffer, before);
+                }
             }
         }
     }
-}
-
-TEST(VrnText, AppendingLeavesABufferWithoutTerminatorAlone)
-{
-    char buffer[4] = {'a', 'b', 'c', 'd'};
-    EXPECT_EQ(vrn_strlcat(buffer, "xyz", sizeof buffer), 4u + 3u);
-    EXPECT_EQ(std::string(buffer, sizeof buffer), "abcd");
-    EXPECT_EQ(vrn_strlcat(buffer, "xyz", 0), 3u);
 }
 
 TEST(VrnText, ComparisonFoldsTheTwentySixLettersAndNothingElse)
@@ -68,12 +60,11 @@ TEST(VrnText, ComparisonFoldsTheTwentySixLettersAndNothingElse)
         const char* b;
         int order;
     } table[] = {
-        {"", "", 0},       {"", "a", -1},     {"objectClass", "OBJECTCLASS", 0},
-        {"cn", "cnx", -1}, {"cn;x", "CN", 1}, {nullptr, nullptr, 0},
-        {nullptr, "", -1}, {"", nullptr, 1},
+        {"", "", 0}, {"", "a", -1}, {"cn;x", "CN", 1}, {nullptr, nullptr, 0}, {nullptr, "", -1}, {"", nullptr, 1},
     };
-    for (const auto& entry : table)
+    for (const auto& entry : table) {
         EXPECT_EQ(sign(vrn_strcasecmp(entry.a, entry.b)), entry.order);
+    }
 }
 
 TEST(VrnText, FormattingCutsOrGrowsAsAsked)

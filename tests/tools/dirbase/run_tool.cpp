@@ -6,42 +6,11 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include <cstring>
-#include <sstream>
 #include <system_error>
 
 namespace fs = std::filesystem;
 
 namespace tool_test {
-
-namespace {
-
-std::vector<char*> pointers_to(std::vector<std::string>& texts)
-{
-    std::vector<char*> pointers;
-    for (std::string& text : texts) {
-        pointers.push_back(text.data());
-    }
-    pointers.push_back(nullptr);
-    return pointers;
-}
-
-std::vector<std::string> environment_with(const std::string& schema_variable)
-{
-    constexpr char variable[] = "DIRBASE_SCHEMA=";
-    std::vector<std::string> environment;
-    for (char** entry = environ; *entry != nullptr; ++entry) {
-        if (std::strncmp(*entry, variable, sizeof(variable) - 1) != 0) {
-            environment.emplace_back(*entry);
-        }
-    }
-    if (!schema_variable.empty()) {
-        environment.push_back(variable + schema_variable);
-    }
-    return environment;
-}
-
-}  // namespace
 
 tool_run run_tool(const std::vector<std::string>& arguments, const run_settings& settings)
 {
@@ -50,10 +19,19 @@ tool_run run_tool(const std::vector<std::string>& arguments, const run_settings&
     const std::string out = settings.output_path.empty() ? streams.write("out", "") : settings.output_path;
     const std::string err = streams.write("err", "");
 
-    std::vector<std::string> words = settings.in_front;
+    std::vector<std::string> words = {"env", "-u", "DIRBASE_SCHEMA"};
+    if (!settings.schema_variable.empty()) {
+        words.push_back("DIRBASE_SCHEMA=" + settings.schema_variable);
+    }
+    words.insert(words.end(), settings.in_front.begin(), settings.in_front.end());
     words.emplace_back(DIRBASE_TOOL);
     words.insert(words.end(), arguments.begin(), arguments.end());
-    std::vector<std::string> environment = environment_with(settings.schema_variable);
+
+    std::vector<char*> pointers;
+    for (std::string& word : words) {
+        pointers.push_back(word.data());
+    }
+    pointers.push_back(nullptr);
 
     posix_spawn_file_actions_t files;
     posix_spawn_file_actions_init(&files);
@@ -61,11 +39,10 @@ tool_run run_tool(const std::vector<std::string>& arguments, const run_settings&
     posix_spawn_file_actions_addopen(&files, STDOUT_FILENO, out.c_str(), O_WRONLY | O_NOCTTY, 0);
     posix_spawn_file_actions_addopen(&files, STDERR_FILENO, err.c_str(), O_WRONLY, 0);
     pid_t child = 0;
-    const int failed = posix_spawnp(&child, words.front().c_str(), &files, nullptr, pointers_to(words).data(),
-                                    pointers_to(environment).data());
+    const int failed = posix_spawnp(&child, "env", &files, nullptr, pointers.data(), environ);
     posix_spawn_file_actions_destroy(&files);
     if (failed != 0) {
-        throw std::system_error(failed, std::generic_category(), words.front());
+        throw std::system_error(failed, std::generic_category(), "env");
     }
     int status = 0;
     waitpid(child, &status, 0);
@@ -77,20 +54,19 @@ tool_run run_tool(const std::vector<std::string>& arguments, const run_settings&
     return result;
 }
 
-folder_contents contents_of(const std::string& folder)
-{
-    folder_contents contents;
-    for (const fs::directory_entry& entry : fs::directory_iterator(folder)) {
-        std::ifstream in(entry.path(), std::ios::binary);
-        contents[entry.path().filename().string()] =
-            std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-    }
-    return contents;
-}
-
 schema_copy::schema_copy()
 {
     fs::copy(DIRBASE_SOURCE_SCHEMA_DIR, folder());
+}
+
+folder_contents schema_copy::contents() const
+{
+    folder_contents contents;
+    for (const fs::directory_entry& entry : fs::directory_iterator(folder())) {
+        const std::string name = entry.path().filename().string();
+        contents[name] = read_schema(name);
+    }
+    return contents;
 }
 
 tool_run schema_copy::run(const std::string& command, const std::vector<std::string>& arguments,
@@ -114,16 +90,6 @@ single_file_schema::single_file_schema(const std::string& text)
 {
     dir_.write("schema.list", "all\n");
     dir_.write("all", text);
-}
-
-std::vector<std::string> lines_of(const std::string& text)
-{
-    std::vector<std::string> lines;
-    std::istringstream in(text);
-    for (std::string line; std::getline(in, line);) {
-        lines.push_back(line);
-    }
-    return lines;
 }
 
 }  // namespace tool_test

@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "tests/support/log_lines.h"
 #include "tests/support/temp_dir.h"
 
 namespace tool_test {
@@ -27,7 +28,6 @@ tool_run run_tool(const std::vector<std::string>& arguments, const run_settings&
 
 // The name and content of every file of a folder.
 using folder_contents = std::map<std::string, std::string>;
-folder_contents contents_of(const std::string& folder);
 
 // A copy of the schema that ships, in a folder of its own beside room for other files.
 class schema_copy {
@@ -35,7 +35,7 @@ public:
     schema_copy();
 
     std::string folder() const { return dir_.path("schema"); }
-    folder_contents contents() const { return contents_of(folder()); }
+    folder_contents contents() const;
 
     // Writes a file of the schema directory, or beside it; returns the path.
     std::string write_schema(const std::string& name, const std::string& text) const
@@ -68,6 +68,6 @@ private:
     test_support::temp_dir dir_;
 };
 
-std::vector<std::string> lines_of(const std::string& text);
+using test_support::lines_of;
 
 }  // namespace tool_test

@@ -44,16 +44,6 @@ struct body : csgl_refcounted<body> {
 
 }  // namespace
 
-TEST(SyncValue, NoChangeOfManyThreadsIsLost)
-{
-    csgl_sync_value value(0);
-    run_threads([&](unsigned) {
-        for (int i = 0; i < 20000; ++i)
-            value.increment(), value.decrement();
-    });
-    EXPECT_EQ(value.value(), 0);
-}
-
 TEST(Handle, CountsItsBodyAndEndsItWithTheLast)
 {
     std::atomic<int> ended{0};

@@ -1,7 +1,8 @@
 // The list: its chain, who frees what, whom it wakes, and many threads that add to it.
 #include <gtest/gtest.h>
 
-#include <cstddef>
+#include <algorithm>
+#include <iterator>
 #include <memory>
 #include <thread>
 #include <vector>
@@ -28,70 +29,51 @@ extern "C" __attribute__((visibility("default"))) int pthread_cond_broadcast(pth
 
 namespace {
 
-// Counts those that are alive.
-struct value {
-    explicit value(int* counter) : alive(counter) { ++*alive; }
-    ~value() { --*alive; }
-    value(const value&) = delete;
-    value& operator=(const value&) = delete;
-    int* alive;
-};
-
 TEST(List, AdditionsMakeAChainThatReadsBothWays)
 {
     List<int*> list(0, true);
     EXPECT_EQ(list.getHead(), nullptr);
     EXPECT_EQ(list.tail, nullptr);
-    std::vector<int> values(5);
-    for (int& v : values) {
-        EXPECT_EQ(list.add(&v), 0);
-        EXPECT_EQ(list.tail->value, &v);
-    }
+    int values[5] = {};
     const ListEntry<int*>* before = nullptr;
-    const ListEntry<int*>* entry = list.getHead();
-    for (int& v : values) {
-        ASSERT_NE(entry, nullptr);
-        EXPECT_EQ(entry->value, &v);
-        EXPECT_EQ(entry->previous, before);
-        before = entry;
-        entry = entry->next;
+    for (int& value : values) {
+        EXPECT_EQ(list.add(&value), 0);
+        const ListEntry<int*>* added = before == nullptr ? list.getHead() : before->next;
+        ASSERT_EQ(list.tail, added);
+        EXPECT_EQ(added->value, &value);
+        EXPECT_EQ(added->previous, before);
+        EXPECT_EQ(added->next, nullptr);
+        before = added;
     }
-    EXPECT_EQ(entry, nullptr);
-    EXPECT_EQ(list.tail, before);
 }
 
 TEST(List, ClearingDeletesTheValuesOnlyWhenAsked)
 {
-    int alive = 0;
-    value* a = new value(&alive);
-    value* b = new value(&alive);
+    const auto shared = std::make_shared<int>();
+    using value = std::shared_ptr<int>;
+    auto* a = new value(shared);
+    auto* b = new value(shared);
     {
         List<value*> list(1, false);
-        list.add(a);
-        list.add(nullptr);
-        list.add(b);
-        list.clear(false);
-        EXPECT_EQ(alive, 2);
-        EXPECT_EQ(list.head, nullptr);
-        EXPECT_EQ(list.tail, nullptr);
-
-        list.add(a);
-        list.add(nullptr);
-        list.clear(true);
-        EXPECT_EQ(alive, 1);
-        EXPECT_EQ(list.head, nullptr);
+        for (const bool deleting : {false, true}) {
+            list.add(a);
+            list.add(nullptr);
+            list.clear(deleting);
+            EXPECT_EQ(shared.use_count(), deleting ? 2 : 3);
+            EXPECT_EQ(list.head, nullptr);
+            EXPECT_EQ(list.tail, nullptr);
+        }
         list.clear(true);  // nothing twice
         list.add(b);
     }
-    EXPECT_EQ(alive, 1) << "a list that goes leaves its values";
+    EXPECT_EQ(shared.use_count(), 2) << "a list that goes leaves its values";
     delete b;
 }
 
 TEST(List, OnlyTheArgumentOneMakesACondition)
 {
     for (const int with : {-1, 0, 1, 2}) {
-        List<int*> list(with, true);
-        EXPECT_EQ(list.getCondition() != nullptr, with == 1) << with;
+        EXPECT_EQ(List<int*>(with, true).getCondition() != nullptr, with == 1) << with;
     }
 }
 
@@ -116,43 +98,37 @@ TEST(List, OnlyTheStepFromEmptyToOneWakes)
 
 TEST(List, AConsumerMeetsEveryValueOfManyProducersInTheirOrder)
 {
-    constexpr std::size_t producers = 4;
-    constexpr std::size_t each = 3000;
-    struct item {
-        std::size_t producer;
-        std::size_t number;
-    };
-    List<item*> list(1, false);
-
-    std::vector<std::thread> threads;
-    for (std::size_t p = 0; p < producers; ++p) {
-        threads.emplace_back([&list, p] {
-            for (std::size_t i = 0; i < each; ++i)
-                EXPECT_EQ(list.add(new item{p, i}), 0);
+    std::vector<std::vector<int>> values(4, std::vector<int>(3000));
+    List<int*> list(1, false);
+    std::vector<std::jthread> threads;
+    for (std::vector<int>& own : values) {
+        threads.emplace_back([&list, &own] {
+            for (int& value : own) {
+                EXPECT_EQ(list.add(&value), 0);
+            }
         });
     }
-    std::vector<std::size_t> next(producers, 0);
-    bool in_order = true;
-    for (std::size_t taken = 0; taken < producers * each;) {
+    std::vector<int*> taken;
+    while (taken.size() < 4 * 3000) {
         pthread_mutex_lock(list.getMutex());
-        while (list.head == nullptr)
+        while (list.head == nullptr) {
             pthread_cond_wait(list.getCondition(), list.getMutex());
-        std::unique_ptr<ListEntry<item*>> entry(list.head);
+        }
+        std::unique_ptr<ListEntry<int*>> entry(list.head);
         list.head = list.tail = nullptr;
         pthread_mutex_unlock(list.getMutex());
-
         for (; entry; entry.reset(entry->next)) {
-            const std::unique_ptr<item> got(entry->value);
-            in_order = in_order && got->number == next[got->producer];
-            ++next[got->producer];
-            ++taken;
+            taken.push_back(entry->value);
         }
     }
-    for (std::thread& thread : threads)
-        thread.join();
-    EXPECT_TRUE(in_order);
-    EXPECT_EQ(next, std::vector<std::size_t>(producers, each));
     EXPECT_EQ(list.head, nullptr);
+    for (std::vector<int>& own : values) {
+        std::vector<int*> mine;
+        std::copy_if(taken.begin(), taken.end(), std::back_inserter(mine),
+                     [&own](const int* value) { return value >= own.data() && value < own.data() + own.size(); });
+        EXPECT_EQ(mine.size(), own.size());
+        EXPECT_TRUE(std::is_sorted(mine.begin(), mine.end()));
+    }
 }
 
 }  // namespace

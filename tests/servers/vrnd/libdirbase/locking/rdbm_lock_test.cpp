@@ -1,4 +1,5 @@
 // The read-write lock: who gets in when, under real contention, and what a damaged lock does.
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <atomic>
@@ -7,6 +8,7 @@
 #include <cstdio>
 #include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
 #include <dlfcn.h>
@@ -25,8 +27,9 @@ thread_local int failing_wait = 0;  // the wait of this thread that fails, count
 
 extern "C" __attribute__((visibility("default"))) int pthread_cond_wait(pthread_cond_t* cond, pthread_mutex_t* mutex)
 {
-    if (failing_wait > 0 && --failing_wait == 0)
+    if (failing_wait > 0 && --failing_wait == 0) {
         return EPERM;
+    }
     using wait_function = int (*)(pthread_cond_t*, pthread_mutex_t*);
     static const auto real = reinterpret_cast<wait_function>(dlsym(RTLD_NEXT, "pthread_cond_wait"));
     return real(cond, mutex);
@@ -40,58 +43,37 @@ protected:
     RdbmLock() { rdbm_lock_init(&lock, "test_lock"); }
     ~RdbmLock() override { rdbm_lock_destroy(&lock); }
 
-    int count()
+    // The count, and whether a writer is inside or in line.
+    std::pair<int, bool> state()
     {
         pthread_mutex_lock(&lock.mutex);
-        const int value = lock.count;
-        pthread_mutex_unlock(&lock.mutex);
-        return value;
-    }
-
-    bool writer()
-    {
-        pthread_mutex_lock(&lock.mutex);
-        const bool value = lock.writer != 0;
+        const std::pair<int, bool> value(lock.count, lock.writer != 0);
         pthread_mutex_unlock(&lock.mutex);
         return value;
     }
 
     // A trylock gives EBUSY when it meets another thread's visit to the mutex; asked again it tells about the lock.
-    template <typename Try>
-    int settled(Try tried)
+    int settled(int (*tried)(rdbm_lock_t*))
     {
         int rc;
-        while ((rc = tried(&lock)) == EBUSY)
+        while ((rc = tried(&lock)) == EBUSY) {
             std::this_thread::yield();
+        }
         return rc;
-    }
-
-    void wait_for_writer_in_line()
-    {
-        while (!writer())
-            std::this_thread::yield();
-    }
-
-    std::string not_set(const char* function)
-    {
-        char text[100];
-        std::snprintf(text, sizeof text, "Error - %s: lock %p not set\n", function, static_cast<void*>(&lock));
-        return text;
     }
 
     rdbm_lock_t lock;
 };
 
 using lock_call = void (*)(rdbm_lock_t*);
-using try_call = int (*)(rdbm_lock_t*);
+constexpr std::pair no_one(0, false);
 
 TEST_F(RdbmLock, TryingFollowsTheStateAndAFailureChangesNothing)
 {
     EXPECT_EQ(_rdbm_rd_trylock(&lock), 0);
     EXPECT_EQ(_rdbm_rd_trylock(&lock), 0);
     EXPECT_EQ(_rdbm_wr_trylock(&lock), -1);
-    EXPECT_EQ(count(), 2);
-    EXPECT_FALSE(writer());
+    EXPECT_EQ(state(), std::pair(2, false));
     _rdbm_rd_unlock(&lock);
     EXPECT_EQ(_rdbm_wr_trylock(&lock), -1);
     _rdbm_unlock(&lock);
@@ -99,11 +81,14 @@ TEST_F(RdbmLock, TryingFollowsTheStateAndAFailureChangesNothing)
     EXPECT_EQ(_rdbm_wr_trylock(&lock), 0);
     EXPECT_EQ(_rdbm_wr_trylock(&lock), -1);
     EXPECT_EQ(_rdbm_rd_trylock(&lock), -1);
-    EXPECT_EQ(count(), -1);
-    EXPECT_TRUE(writer());
+    EXPECT_EQ(state(), std::pair(-1, true));
     _rdbm_unlock(&lock);
-    EXPECT_EQ(count(), 0);
-    EXPECT_FALSE(writer());
+
+    pthread_mutex_lock(&lock.mutex);
+    EXPECT_EQ(_rdbm_rd_trylock(&lock), EBUSY);
+    EXPECT_EQ(_rdbm_wr_trylock(&lock), EBUSY);
+    pthread_mutex_unlock(&lock.mutex);
+    EXPECT_EQ(state(), no_one);
 }
 
 TEST_F(RdbmLock, AWriterInLineGoesAheadOfLaterReaders)
@@ -111,16 +96,17 @@ TEST_F(RdbmLock, AWriterInLineGoesAheadOfLaterReaders)
     _rdbm_rd_lock(&lock);
     _rdbm_rd_lock(&lock);
     std::atomic<int> order = 0;
-    std::atomic<int> writer_came = 0;
     std::atomic<int> reader_came = 0;
     std::thread writing([&] {
         _rdbm_wr_lock(&lock);
-        writer_came = ++order;
+        EXPECT_EQ(++order, 1);
         std::this_thread::sleep_for(std::chrono::milliseconds(5));
         EXPECT_EQ(reader_came, 0);
         _rdbm_wr_unlock(&lock);
     });
-    wait_for_writer_in_line();
+    while (state() != std::pair(2, true)) {
+        std::this_thread::yield();
+    }
     EXPECT_EQ(settled(_rdbm_rd_trylock), -1);
     EXPECT_EQ(settled(_rdbm_wr_trylock), -1);
     std::thread reading([&] {
@@ -129,88 +115,64 @@ TEST_F(RdbmLock, AWriterInLineGoesAheadOfLaterReaders)
         _rdbm_rd_unlock(&lock);
     });
     std::this_thread::sleep_for(std::chrono::milliseconds(5));
-    EXPECT_EQ(order, 0) << "nobody enters while the first readers are inside";
-    EXPECT_EQ(count(), 2);
+    EXPECT_EQ(state(), std::pair(2, true)) << "nobody enters while the first readers are inside";
     _rdbm_rd_unlock(&lock);
     EXPECT_EQ(order, 0);
     _rdbm_rd_unlock(&lock);
     writing.join();
     reading.join();
-    EXPECT_EQ(writer_came, 1);
     EXPECT_EQ(reader_came, 2);
-    EXPECT_EQ(count(), 0);
+    EXPECT_EQ(state(), no_one);
 }
 
 TEST_F(RdbmLock, WritersExcludeEverybodyAndReadersShare)
 {
-    constexpr int rounds = 2000;
     long first = 0;  // plain words that only the lock protects
     long second = 0;
     std::atomic<long> torn = 0;
     std::atomic<long> written = 0;
-
+    const auto write = [&](int round, bool trying) {
+        if (trying && _rdbm_wr_trylock(&lock) != 0) {
+            return;
+        }
+        if (!trying) {
+            _rdbm_wr_lock(&lock);
+        }
+        ++first;
+        ++second;
+        ++written;
+        round % 3 == 0 ? _rdbm_unlock(&lock) : _rdbm_wr_unlock(&lock);
+    };
+    const auto read = [&](int round, bool trying) {
+        if (trying && _rdbm_rd_trylock(&lock) != 0) {
+            return;
+        }
+        if (!trying) {
+            _rdbm_rd_lock(&lock);
+        }
+        torn += first != second;
+        round % 3 == 0 ? _rdbm_unlock(&lock) : _rdbm_rd_unlock(&lock);
+    };
     std::vector<std::thread> threads;
-    for (int i = 0; i < 3; ++i) {
+    for (int i = 0; i < 7; ++i) {  // two that write, three that read, and two that do both, as a schema change does
         threads.emplace_back([&, i] {
-            for (int n = 0; n < rounds; ++n) {
-                if (i == 0 && n % 2 == 0) {
-                    if (_rdbm_wr_trylock(&lock) != 0)
-                        continue;
-                } else {
-                    _rdbm_wr_lock(&lock);
+            for (int round = 0; round < 2000; ++round) {
+                if (i < 4) {
+                    write(round, i == 0 && round % 2 == 0);
                 }
-                ++first;
-                ++second;
-                ++written;
-                n % 3 == 0 ? _rdbm_unlock(&lock) : _rdbm_wr_unlock(&lock);
+                if (i >= 2) {
+                    read(round, i == 6 && round % 2 == 0);
+                }
             }
         });
     }
-    for (int i = 0; i < 4; ++i) {
-        threads.emplace_back([&, i] {
-            for (int n = 0; n < rounds; ++n) {
-                if (i == 0 && n % 2 == 0) {
-                    if (_rdbm_rd_trylock(&lock) != 0)
-                        continue;
-                } else {
-                    _rdbm_rd_lock(&lock);
-                }
-                torn += first != second;
-                n % 3 == 0 ? _rdbm_unlock(&lock) : _rdbm_rd_unlock(&lock);
-            }
-        });
-    }
-    for (std::thread& thread : threads)
+    for (std::thread& thread : threads) {
         thread.join();
+    }
     EXPECT_EQ(torn, 0);
     EXPECT_EQ(first, written);
     EXPECT_EQ(second, written);
-    EXPECT_EQ(count(), 0);
-    EXPECT_FALSE(writer());
-}
-
-TEST_F(RdbmLock, TheReadSideIsLeftForTheWriteSideAndTakenBack)
-{
-    // What a schema change does while other operations read: each thread comes and goes with the read side held.
-    std::atomic<int> inside = 0;
-    std::vector<std::thread> threads;
-    for (int i = 0; i < 4; ++i) {
-        threads.emplace_back([&] {
-            for (int n = 0; n < 300; ++n) {
-                _rdbm_rd_lock(&lock);
-                _rdbm_rd_unlock(&lock);
-                _rdbm_wr_lock(&lock);
-                EXPECT_EQ(++inside, 1);
-                --inside;
-                _rdbm_wr_unlock(&lock);
-                _rdbm_rd_lock(&lock);
-                _rdbm_rd_unlock(&lock);
-            }
-        });
-    }
-    for (std::thread& thread : threads)
-        thread.join();
-    EXPECT_EQ(count(), 0);
+    EXPECT_EQ(state(), no_one);
 }
 
 TEST_F(RdbmLock, ReleasingWhatIsNotHeldIsReportedAndChangesNothing)
@@ -221,68 +183,48 @@ TEST_F(RdbmLock, ReleasingWhatIsNotHeldIsReportedAndChangesNothing)
         int held;  // the state: readers inside, or -1
         bool reported;
     } table[] = {
-        {"_rdbm_rd_unlock", _rdbm_rd_unlock, 0, true},   {"_rdbm_wr_unlock", _rdbm_wr_unlock, 0, true},
-        {"_rdbm_unlock", _rdbm_unlock, 0, true},         {"_rdbm_rd_unlock", _rdbm_rd_unlock, -1, true},
-        {"_rdbm_wr_unlock", _rdbm_wr_unlock, 1, true},   {"_rdbm_unlock", _rdbm_unlock, -1, false},
-        {"_rdbm_unlock", _rdbm_unlock, 1, false},        {"_rdbm_rd_unlock", _rdbm_rd_unlock, 1, false},
-        {"_rdbm_wr_unlock", _rdbm_wr_unlock, -1, false},
+        {"_rdbm_rd_unlock", _rdbm_rd_unlock, -1, true}, {"_rdbm_rd_unlock", _rdbm_rd_unlock, 0, true},
+        {"_rdbm_rd_unlock", _rdbm_rd_unlock, 1, false}, {"_rdbm_wr_unlock", _rdbm_wr_unlock, -1, false},
+        {"_rdbm_wr_unlock", _rdbm_wr_unlock, 0, true},  {"_rdbm_wr_unlock", _rdbm_wr_unlock, 1, true},
+        {"_rdbm_unlock", _rdbm_unlock, -1, false},      {"_rdbm_unlock", _rdbm_unlock, 0, true},
+        {"_rdbm_unlock", _rdbm_unlock, 1, false},
     };
     for (const auto& entry : table) {
-        if (entry.held != 0)
+        SCOPED_TRACE(entry.name + std::to_string(entry.held));
+        if (entry.held != 0) {
             (entry.held < 0 ? _rdbm_wr_lock : _rdbm_rd_lock)(&lock);
-
+        }
         const debug_catcher caught;
         entry.release(&lock);
-        if (!entry.reported) {
-            EXPECT_EQ(caught.count(), 0u) << entry.name << " of " << entry.held;
-            EXPECT_EQ(count(), 0);
-            continue;
+        EXPECT_EQ(state().first, entry.reported ? entry.held : 0);
+        ASSERT_EQ(caught.count(), entry.reported ? 2u : 0u);
+        if (entry.reported) {
+            char text[100];
+            std::snprintf(text, sizeof text, "Error - %s: lock %p not set\n", entry.name, static_cast<void*>(&lock));
+            EXPECT_EQ(caught.texts()[0], text);
+            EXPECT_THAT(caught.texts()[1], testing::MatchesRegex("      - in file .*rdbm_lock.cpp near line [0-9]+\n"));
+            lock.count = 0;
+            lock.writer = 0;
         }
-        const auto texts = caught.texts();
-        ASSERT_EQ(texts.size(), 2u) << entry.name << " of " << entry.held;
-        EXPECT_EQ(texts[0], not_set(entry.name));
-        EXPECT_EQ(texts[1].rfind("      - in file ", 0), 0u) << texts[1];
-        EXPECT_NE(texts[1].find("rdbm_lock.cpp near line "), std::string::npos) << texts[1];
-        EXPECT_EQ(count(), entry.held);
-        if (entry.held != 0)
-            _rdbm_unlock(&lock);
     }
-}
-
-TEST_F(RdbmLock, ABusyMutexMakesTryingGiveItsCode)
-{
-    pthread_mutex_lock(&lock.mutex);
-    EXPECT_EQ(_rdbm_rd_trylock(&lock), EBUSY);
-    EXPECT_EQ(_rdbm_wr_trylock(&lock), EBUSY);
-    pthread_mutex_unlock(&lock.mutex);
-    EXPECT_EQ(count(), 0);
-    EXPECT_FALSE(writer());
 }
 
 TEST_F(RdbmLock, AMutexThatCannotBeLockedIsReportedAndTheLockStaysAsItWas)
 {
+    constexpr pthread_mutex_t checking = PTHREAD_ERRORCHECK_MUTEX_INITIALIZER_NP;
     pthread_mutex_destroy(&lock.mutex);
-    pthread_mutexattr_t attributes;
-    pthread_mutexattr_init(&attributes);
-    pthread_mutexattr_settype(&attributes, PTHREAD_MUTEX_ERRORCHECK);
-    pthread_mutex_init(&lock.mutex, &attributes);
-    pthread_mutexattr_destroy(&attributes);
-
-    const struct {
-        const char* name;
-        lock_call call;
-    } table[] = {
+    lock.mutex = checking;
+    const std::pair<const char*, lock_call> table[] = {
         {"_rdbm_rd_lock", _rdbm_rd_lock},     {"_rdbm_wr_lock", _rdbm_wr_lock}, {"_rdbm_rd_unlock", _rdbm_rd_unlock},
         {"_rdbm_wr_unlock", _rdbm_wr_unlock}, {"_rdbm_unlock", _rdbm_unlock},
     };
     _rdbm_rd_lock(&lock);
     pthread_mutex_lock(&lock.mutex);  // a second lock by this thread is EDEADLK
-    for (const auto& entry : table) {
+    const std::string failed = ": pthread_mutex_lock error. rc = " + std::to_string(EDEADLK) + "\n";
+    for (const auto& [name, call] : table) {
         const debug_catcher caught;
-        entry.call(&lock);
-        EXPECT_TRUE(caught.has("Error - " + std::string(entry.name) +
-                               ": pthread_mutex_lock error. rc = " + std::to_string(EDEADLK) + "\n"))
-            << entry.name;
+        call(&lock);
+        EXPECT_EQ(caught.texts().at(0), "Error - " + (name + failed));
         EXPECT_EQ(caught.count(), 2u);
         EXPECT_EQ(lock.count, 1);
         EXPECT_EQ(lock.writer, 0);
@@ -297,10 +239,10 @@ TEST_F(RdbmLock, NoReaderEntersBeyondTheRangeOfTheCount)
     EXPECT_EQ(_rdbm_rd_trylock(&lock), -1);
     std::thread late([&] { _rdbm_rd_lock(&lock); });
     std::this_thread::sleep_for(std::chrono::milliseconds(5));
-    EXPECT_EQ(count(), 32767);
+    EXPECT_EQ(state().first, 32767);
     _rdbm_rd_unlock(&lock);
     late.join();
-    EXPECT_EQ(count(), 32767);
+    EXPECT_EQ(state().first, 32767);
     lock.count = 0;
 }
 
@@ -318,18 +260,15 @@ TEST_F(RdbmLock, AWaitThatFailsGivesUpAndLetsOthersGoOn)
     _rdbm_wr_lock(&lock);  // behind another writer
     EXPECT_TRUE(caught.has("Error - _rdbm_wr_lock" + failed));
     EXPECT_EQ(caught.count(), 4u);
-    EXPECT_EQ(count(), -1);
     _rdbm_wr_unlock(&lock);
 
     _rdbm_rd_lock(&lock);
     failing_wait = 1;
     _rdbm_wr_lock(&lock);  // first in line, behind a reader
     EXPECT_EQ(caught.count(), 6u);
-    EXPECT_EQ(count(), 1);
-    EXPECT_EQ(_rdbm_rd_trylock(&lock), 0) << "the place in line is given up";
+    EXPECT_EQ(state(), std::pair(1, false)) << "the place in line is given up";
     _rdbm_rd_unlock(&lock);
-    _rdbm_rd_unlock(&lock);
-    EXPECT_EQ(count(), 0);
+    EXPECT_EQ(state(), no_one);
 }
 #endif
 
