@@ -120,7 +120,7 @@ int attr_merge_fast(Entry* entry, const char* name, berval** values, std::int64_
         if (is_too_long(tag)) {
             return refuse_tag("Error - attr_merge: parse_language_tags() failed.\n");
         }
-        const int result = insert_by_name(*entry, name, tag, info, attr);
+        const int result = flatattr_insert(entry, info, name, attr, tag);
         if (result != LDAP_SUCCESS) {
             debug_error("Error - attr_merge_fast: flatattr_insert() failed.\n");
             return result;

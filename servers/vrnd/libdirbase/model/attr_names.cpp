@@ -130,9 +130,8 @@ bool attr_selected(const char* name, char** list)
 
 bool is_subtype_attr(const char* a, const char* b)
 {
-    const char* const tag_a = find_language_tag(a);
-    const char* const tag_b = find_language_tag(b);
-    if (tag_a != nullptr && (tag_b == nullptr || strtagcmp(tag_a, tag_b) != 0)) {
+    const bool marked = std::strchr(a, ';') != nullptr;
+    if (marked && (std::strchr(b, ';') == nullptr || strtagcmp(find_language_tag(a), find_language_tag(b)) != 0)) {
         return false;
     }
     return ldcf_api_attr_get_info(a, nullptr) == ldcf_api_attr_get_info(b, nullptr);

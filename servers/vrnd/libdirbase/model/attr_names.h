@@ -41,8 +41,8 @@ DIRBASE_EXPORT bool is_string_alphanum(const char* text);
 // Whether a name is among those that a client asks for: true when the list is null, holds the name, or holds "*".
 DIRBASE_EXPORT bool attr_selected(const char* name, char** list);
 
-// Whether the first name is the attribute of the second, or a version of it: false when only the first has a tag, and
-// when the tags differ. Looks both up; two names that the schema doesn't know count as one attribute.
+// Whether the first name is the attribute of the second, or a version of it: false when only the first has a ";",
+// and when both have one and the tags differ. Looks both up; two names that the schema doesn't know count as one attribute.
 DIRBASE_EXPORT bool is_subtype_attr(const char* a, const char* b);
 
 // Checks a mapping: two names joined by "$", the first of them in the schema, which is looked up, the second

@@ -3,11 +3,11 @@
 
 #include <cstddef>
 
-#include <strings.h>
+#include <cstddef>
 
 constexpr std::size_t oid_prefix_length = 4;
 
 inline bool has_oid_prefix(const char* name)
 {
-    return strncasecmp(name, "oid.", oid_prefix_length) == 0;
+    return (name[0] | 0x20) == 'o' && (name[1] | 0x20) == 'i' && (name[2] | 0x20) == 'd' && name[3] == '.';
 }

@@ -9,8 +9,8 @@
 //   - Of an encrypted attribute, values in their stored form are looked at as bytes. They stay out of the tree, whose
 //     other nodes they don't compare with.
 //
-// Concurrent readers of a finished attribute may call value_find and value_find_short_list. For DNs the caller holds
-// the read side of the schema lock.
+// Concurrent readers of a finished attribute may call value_find and value_find_short_list. Everything here reads the
+// attribute's schema record: the caller holds the read side of the schema lock.
 #pragma once
 
 #include <cstdint>

@@ -5,8 +5,8 @@
 // from e_sorted_low by a_sorted_next.
 //
 // An entry, its attributes and their values are changed by one thread at a time; while nobody changes them any number
-// of threads may read. Calls that take or look up a schema record are made under the read side of the schema lock
-// (ldcf_api_get_modify_attr_info_lock_g). Where a schema record may be given it is the one of the name, and null has
+// of threads may read. Calls are made under the read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g), to
+// which the schema records belong. Where a schema record may be given it is the one of the name, and null has
 // the name looked up.
 #pragma once
 
@@ -47,7 +47,8 @@ extern "C" {
 //                    schema's first name, where there is one, with the tag behind it.
 //   values           null-terminated; null for none.
 //   drop_duplicates  1: values that are there already are passed over, without a failure.
-//   tree_mode        0: no value tree (a tree that was there is dropped, for it would lack the new values)
+//   tree_mode        0: without drop_duplicates no value tree (one that was there is dropped, for it would lack the new
+//                       values); with it as 1
 //                    1: the value tree is kept or built
 //                    2: as 1, and values of an attribute encrypted two ways are decoded first
 //                    In use are (0, 0) for internal data, (1, 1) for modifications, (0, 1) and (x, 2).

@@ -6,9 +6,11 @@
 //
 // Every call either adds all values that it is given (less the duplicates, where these are dropped) or none: after a
 // failure the attribute has its old values and its old tree. Memory running out gives LDAP_NO_MEMORY and a line in the
-// debug log. What adds values drops a_decoded, which would lack them.
+// debug log. What adds values to an attribute drops a_decoded, which would lack them; for value_add_fast, which doesn't
+// know the attribute, that and the tree are the caller's to drop.
 //
-// One thread at a time changes an attribute. For values of DN syntax it holds the read side of the schema lock.
+// One thread at a time changes an attribute. It holds the read side of the schema lock, since the attribute's schema
+// record is read. The values that are given may not be the attribute's own array.
 #pragma once
 
 #include <cstdint>
@@ -23,14 +25,16 @@ constexpr int VALUES_ARE_CLEAR =
 
 extern "C" {
 
-// Appends copies of values, unchecked. A value tree is dropped, as it would lack them.
+// Appends copies of values, unchecked. A value tree is dropped, as it would lack them; the next value_add_normalize
+// builds it anew, so the two don't go well in turns. Returns LDAP_SUCCESS or LDAP_NO_MEMORY.
 //
 //   array   &attr->a_vals; becomes an array of one pointer at least
 //   values  null-terminated; null for none
 //   attr    not null: its counts are used and kept
 DIRBASE_EXPORT int value_add(berval*** array, berval** values, Attribute* attr);
 
-// Appends copies of values for a caller that keeps the counts himself. The room is doubled until it suffices.
+// Appends copies of values for a caller that keeps the counts himself. The room is doubled until it suffices. Returns
+// LDAP_SUCCESS or LDAP_NO_MEMORY; *array and *capacity may have grown then, and the values are the old ones.
 //
 //   array      *array may be null
 //   old_count  values in the array

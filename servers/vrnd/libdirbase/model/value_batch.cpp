@@ -91,7 +91,7 @@ public:
         if (result != LDAP_SUCCESS) {
             undo(had_tree);
         }
-        if (!keep_tree_) {
+        if (result == LDAP_SUCCESS && !keep_tree_) {
             attr_free_normvals(&attr_);
         }
         *out_count = added_;
