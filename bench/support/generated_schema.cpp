@@ -2,6 +2,7 @@
 #include "bench/support/generated_schema.h"
 
 #include <algorithm>
+#include <cstdlib>
 #include <filesystem>
 #include <fstream>
 #include <iterator>
@@ -9,6 +10,7 @@
 #include <stdexcept>
 
 #include "servers/vrnd/libdirbase/base/backend.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_api.h"
 
 namespace bench_support {
 
@@ -245,6 +247,19 @@ std::string shipped_schema_text()
         text += read_file(file);
     }
     return text;
+}
+
+void require_shipped_schema()
+{
+    if (!ldcf_schema_g->attribute_types.empty()) {
+        return;
+    }
+    provide_backend();
+    ldcf_api_schema_init();
+    ldcf_schema_g->parse_str(shipped_schema_text().c_str(), "shipped");
+    if (ldcf_api_schema_complete() != 0 || ldcf_api_schema_complete_db_names() != 0) {
+        std::abort();
+    }
 }
 
 void provide_backend()

@@ -21,17 +21,6 @@ namespace {
 
 constexpr int calls = 1000;
 
-// The shipped schema as the active one; loaded once for the program.
-void provide_schema()
-{
-    [[maybe_unused]] static const bool loaded = [] {
-        bench_support::provide_backend();
-        ldcf_api_schema_init();
-        ldcf_schema_g->parse_str(bench_support::shipped_schema_text().c_str(), "shipped");
-        return ldcf_api_schema_complete() == 0 && ldcf_api_schema_complete_db_names() == 0;
-    }();
-}
-
 void report(benchmark::State& state, const bench_support::best_time& measured)
 {
     state.counters["ns"] = measured.seconds() * 1e9 / calls;
@@ -39,7 +28,7 @@ void report(benchmark::State& state, const bench_support::best_time& measured)
 
 void BM_DnNormalizeEsc(benchmark::State& state, const char* dn, std::size_t rdns, std::size_t pairs)
 {
-    provide_schema();
+    bench_support::require_shipped_schema();
     std::string folded = dn;
     bench_support::best_time normalising;
     bench_support::best_time yardstick;

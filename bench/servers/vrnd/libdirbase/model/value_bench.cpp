@@ -35,18 +35,6 @@ constexpr std::size_t at_a_time = 500;
 constexpr std::size_t rounds = 30;
 constexpr std::uint32_t dn_syntax = SC_DN | SC_CIS;
 
-void load_schema()
-{
-    static const bool loaded = [] {
-        bench_support::provide_backend();
-        ldcf_api_schema_init();
-        ldcf_schema_g->parse_str(bench_support::shipped_schema_text().c_str(), "shipped");
-        ldcf_schema_g->complete();
-        return ldcf_api_schema_complete_db_names() == 0;
-    }();
-    benchmark::DoNotOptimize(loaded);
-}
-
 std::string member(std::size_t number)
 {
     return "cn=Member " + std::to_string(number) + ", ou=People, o=Acme, c=us";
@@ -66,7 +54,7 @@ class group {
 public:
     explicit group(std::size_t count) : numbers_(count + at_a_time * rounds)
     {
-        load_schema();
+        bench_support::require_shipped_schema();
         std::iota(numbers_.begin(), numbers_.end(), std::size_t{0});
         std::shuffle(numbers_.begin(), numbers_.end(), std::mt19937(1));
         flatattr_insert(&entry_, ldcf_api_attr_get_info("member", nullptr), "member", &attr_, nullptr);

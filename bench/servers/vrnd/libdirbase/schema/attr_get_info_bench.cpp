@@ -32,6 +32,7 @@ public:
     explicit active_schema(schema_kind kind)
     {
         bench_support::provide_backend();
+        ldcf_schema_g->clear();
         ldcf_api_schema_init();
         if (kind == shipped) {
             ldcf_schema_g->parse_str(bench_support::shipped_schema_text().c_str(), "shipped");

@@ -25,6 +25,7 @@ public:
     explicit active_schema(layout where)
     {
         bench_support::provide_backend();
+        ldcf_schema_g->clear();
         std::vector<schema_text> files = bench_support::generate_schema(bench_support::large_schema);
         if (where == layout::one_file) {
             std::string all;
