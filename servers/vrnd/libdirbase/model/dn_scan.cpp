@@ -6,6 +6,7 @@
 #include "libraries/libber/ldap_env.h"
 #include "libraries/libmsg/debug_log.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
+#include "servers/vrnd/libdirbase/base/oid_prefix.h"
 #include "servers/vrnd/libdirbase/model/dn_chars.h"
 #include "servers/vrnd/libdirbase/model/dn_esc.h"
 
@@ -33,13 +34,6 @@ bool can_escape(char c, dn_form form)
 }
 
 // ---- types --------------------------------------------------------------------------------------------------------
-
-// Whether "oid." stands here, in any case.
-bool has_oid_prefix(const char* at)
-{
-    constexpr char to_lower = 'a' - 'A';
-    return (at[0] | to_lower) == 'o' && (at[1] | to_lower) == 'i' && (at[2] | to_lower) == 'd' && at[3] == '.';
-}
 
 // Ends a scan of a type at `at`, where something is wrong; the older form takes the end of the text for an end.
 dn_element bad_type(dn_element type, const char* at, int error, dn_form form)

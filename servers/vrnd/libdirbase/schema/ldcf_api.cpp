@@ -8,6 +8,7 @@
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libvrnutil/vrn_text.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
+#include "servers/vrnd/libdirbase/base/oid_prefix.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_hash_index.h"
@@ -37,10 +38,7 @@ int guarded(const char* failure, Step&& step)
 
 const char* skip_oid_prefix(const char* name)
 {
-    constexpr char to_lower = 'a' - 'A';
-    const bool prefixed =
-        (name[0] | to_lower) == 'o' && (name[1] | to_lower) == 'i' && (name[2] | to_lower) == 'd' && name[3] == '.';
-    return prefixed ? name + 4 : name;
+    return has_oid_prefix(name) ? name + oid_prefix_length : name;
 }
 
 // Whether a name ends in ";binary", with something in front of it.

@@ -7,26 +7,12 @@
 #include "servers/vrnd/libcsgl/csgl_exception.h"
 #include "servers/vrnd/libcsgl/csgl_output.h"
 #include "tests/support/alloc_fault.h"
+#include "tests/support/expect_clean.h"
 
 using test_support::alloc_fault_pause;
 using test_support::allocation_failed;
+using test_support::expect_clean;
 using test_support::for_each_failing_allocation;
-
-namespace {
-
-// Runs the action, which must raise the exception for memory if an allocation has failed and nothing otherwise.
-void expect_clean(const std::function<void()>& action)
-{
-    bool refused = false;
-    try {
-        action();
-    } catch (const exc_not_enough_memory_t& e) {
-        refused = std::string_view(e.message().text()) == "not enough memory" && *e.message().printed() == '\0';
-    }
-    EXPECT_EQ(refused, allocation_failed());
-}
-
-}  // namespace
 
 TEST(StringAlloc, AFailureLeavesEveryTextAsItWas)
 {

@@ -6,6 +6,7 @@
 #include "servers/vrnd/libdirbase/schema/ldcf_schema_modify.h"
 #include "tests/servers/vrnd/libdirbase/schema/schema_fixture.h"
 #include "tests/support/alloc_fault.h"
+#include "tests/support/expect_clean.h"
 #include "tests/support/temp_dir.h"
 
 using schema_test::content_of;
@@ -13,21 +14,10 @@ using schema_test::described;
 using schema_test::parsed;
 using test_support::alloc_fault_pause;
 using test_support::allocation_failed;
+using test_support::expect_clean;
 using test_support::for_each_failing_allocation;
 
 namespace {
-
-// Runs the action, which must raise the exception for memory if an allocation has failed, and nothing otherwise.
-void expect_clean(const std::function<void()>& action)
-{
-    bool refused = false;
-    try {
-        action();
-    } catch (const exc_not_enough_memory_t&) {
-        refused = true;
-    }
-    EXPECT_EQ(refused, allocation_failed());
-}
 
 // A schema with all of the grammar, and without the required definitions.
 const std::string tiny_text =
