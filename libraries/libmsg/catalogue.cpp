@@ -27,6 +27,7 @@ constexpr bool operator<(const catalogue_entry& a, const catalogue_entry& b)
 
 constexpr catalogue_entry catalogue[] = {
     {MSG_COMPONENT_SERVER, 7, "The server is out of memory."},
+    {MSG_COMPONENT_SERVER, 92, "The modification of attribute %1$s has no values."},
     {MSG_COMPONENT_SERVER, 106, "A tree of the server is damaged: %1$s."},
     {MSG_COMPONENT_SERVER, 168, "The attribute %1$s of an attribute mapping is not defined in the schema."},
     {MSG_COMPONENT_SERVER, 170, "The attribute name %1$s of an attribute mapping is not well-formed."},
@@ -89,7 +90,11 @@ constexpr catalogue_entry catalogue[] = {
     {MSG_COMPONENT_SCHEMA, 49,
      "The %1$s matching rule %2$s of attribute %3$s differs from its EQUALITY matching rule in case sensitivity."},
 
+    {MSG_COMPONENT_RDBM, 7, "The entry %1$s has no object class."},
+    {MSG_COMPONENT_RDBM, 8, "The attribute %1$s is required, and missing from the entry %2$s."},
+    {MSG_COMPONENT_RDBM, 9, "The attribute %1$s is not allowed in the entry %2$s."},
     {MSG_COMPONENT_RDBM, 13, "The attribute %1$s is not defined in the schema."},
+    {MSG_COMPONENT_RDBM, 26, "The object class %1$s is not defined in the schema."},
     {MSG_COMPONENT_RDBM, 28, "The conversion between UTF-8 and the local code page %1$s is not available."},
     {MSG_COMPONENT_RDBM, 29, "A text could not be converted between UTF-8 and the local code page."},
     {MSG_COMPONENT_RDBM, 30, "The table name %1$s is too long for the store and has been cut to %2$s."},

@@ -3,6 +3,8 @@
 
 #include "libraries/libavl/avl.h"
 #include "libraries/libber/berval.h"
+#include "libraries/libber/ldap_control.h"
+#include "libraries/libber/ldap_mod.h"
 #include "libraries/libber/ldap_result.h"
 #include "servers/vrnd/libcsgl/csgl_exception.h"
 #include "servers/vrnd/libcsgl/csgl_file.h"

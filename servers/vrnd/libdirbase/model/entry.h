@@ -1,11 +1,15 @@
 // The entry: a DN, its normal form, and the attributes, each of them a record on two lists (attribute.h).
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 
+#include "libraries/dirbase_export.h"
 #include "libraries/libber/berval.h"
+#include "libraries/libber/ldap_mod.h"
 
 struct Attribute;
+struct avl_node;
 
 // Bits of e_flag.
 constexpr std::uint8_t ENTRY_IN_CACHE = 0x01;              // the entry belongs to a cache, which alone may release it
@@ -40,3 +44,30 @@ struct Entry {
     std::int64_t e_member_count;
     std::int64_t e_uniquemember_count;
 };
+
+extern "C" {
+
+// Makes a zeroed entry. Returns LDAP_SUCCESS, or LDAP_NO_MEMORY with *entry null.
+DIRBASE_EXPORT int CreateEntry(Entry** entry);
+
+// Releases an entry with all that it owns. An entry that belongs to a cache (ENTRY_IN_CACHE) stays as it is, with a
+// line in the debug log. Null does nothing.
+DIRBASE_EXPORT void entry_free(Entry* entry);
+
+// Whether the entry holds a value of an attribute. `value` has `length` bytes. Values of `objectclass`, and of an
+// attribute without a value tree, compare without regard to the case of ASCII letters, others by their syntax. False
+// for a null argument.
+DIRBASE_EXPORT bool verify_attribute(const Entry* entry, const char* name, const char* value, std::size_t length);
+
+// Removes the values of a modification, which are bervals, or for one without values the whole attribute. The value
+// tree keeps them: it is
+// the caller's to mend, by delete_valuetree_value. An attribute may be left with no values.
+//
+// Returns LDAP_SUCCESS, or LDAP_NO_SUCH_ATTRIBUTE for an attribute or value that isn't there; the values that are there
+// are gone in any case.
+DIRBASE_EXPORT int delete_values_from_entry(Entry* entry, const LDAPMod* mod);
+
+// Releases the nodes of a value tree with their values. Null does nothing. Returns 0.
+DIRBASE_EXPORT int free_attrtree(avl_node* node);
+
+}  // extern "C"
