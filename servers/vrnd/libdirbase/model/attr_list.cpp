@@ -1,7 +1,7 @@
 // The records of an entry on their two lists: making, finding, walking and removing them (attribute.h).
 //
-// In the sorted list a record stands by its key: the schema's first name where it is known, else the name as stored. So
-// all versions of a known attribute stand side by side, and a walk that looks for one can't pass it by.
+// In the sorted list a record stands by its key (attr_index.h). So all versions of a known attribute stand side by side,
+// and a walk that looks for one can't pass it by. An entry in which such a walk gets long is given an index.
 #include <cstddef>
 #include <cstdlib>
 #include <cstring>
@@ -12,6 +12,7 @@
 #include "libraries/libvrnutil/vrn_text.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
 #include "servers/vrnd/libdirbase/model/attr_ids.h"
+#include "servers/vrnd/libdirbase/model/attr_index.h"
 #include "servers/vrnd/libdirbase/model/attr_value_tree.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
@@ -22,11 +23,6 @@ namespace {
 int first_letter(const char* name)
 {
     return *name >= 'A' && *name <= 'Z' ? *name - 'A' + 'a' : static_cast<unsigned char>(*name);
-}
-
-const char* key_of(const asyntaxinfo* info, const char* name)
-{
-    return info != nullptr ? info->names[0] : name;
 }
 
 bool has_tag(const char* tag)
@@ -69,40 +65,53 @@ Attribute* next_of(Attribute* at, const asyntaxinfo* info)
     return info == nullptr ? nullptr : at;
 }
 
-// Where a version stands: its record, or else the two between which it belongs, either of them null at an end.
+// How many records a walk may pass before the entry is given an index.
+constexpr int longest_walk = 64;
+
+// Where a version stands: its record, or else where it belongs.
 struct sorted_place {
     Attribute* found;
-    Attribute* below;
-    Attribute* above;
+    sorted_neighbours neighbours;
+    int passed;  // how many records the walk went by
 };
 
 // Walks down from the largest name. Names are compared as a whole only within one first letter.
-sorted_place find_place(const Entry& entry, const asyntaxinfo* info, const char* name, const char* tag)
+sorted_place walk_to_place(const Entry& entry, const asyntaxinfo* info, const char* name, const char* tag)
 {
-    const char* const key = key_of(info, name);
+    const char* const key = attr_key(info, name);
     const int letter = first_letter(key);
     Attribute* above = nullptr;
     Attribute* at = entry.e_sorted_high;
-    for (; at != nullptr; above = std::exchange(at, at->a_sorted_prev)) {
+    int passed = 0;
+    for (; at != nullptr; above = std::exchange(at, at->a_sorted_prev), ++passed) {
         if (info != nullptr && at->a_info == info) {
             if (strtagcmp(find_language_tag(at->a_type), tag) == 0) {
-                return {at, nullptr, nullptr};
+                return {at, {}, passed};
             }
             continue;
         }
-        const char* const other = key_of(at->a_info, at->a_type);
+        const char* const other = attr_key(at->a_info, at->a_type);
         const int other_letter = first_letter(other);
         const int order = other_letter != letter ? other_letter - letter : vrn_strcasecmp(other, key);
         // Equal keys of unlike records: the schema has come to know, or to lose, the attribute in between.
         const bool both_unknown = info == nullptr && at->a_info == nullptr;
         if (order == 0 && (both_unknown || strtagcmp(find_language_tag(at->a_type), tag) == 0)) {
-            return {at, nullptr, nullptr};
+            return {at, {}, passed};
         }
         if (order < 0) {
             break;
         }
     }
-    return {nullptr, at, above};
+    return {nullptr, {at, above}, passed};
+}
+
+sorted_place find_place(const Entry& entry, const asyntaxinfo* info, const char* name, const char* tag)
+{
+    if (entry.e_index == nullptr) {
+        return walk_to_place(entry, info, name, tag);
+    }
+    const char* const key = attr_key(info, name);
+    return {entry.e_index->find(key, tag), entry.e_index->place(entry, key), 0};
 }
 
 Attribute* new_attribute(const char* name, asyntaxinfo* info)
@@ -117,7 +126,7 @@ Attribute* new_attribute(const char* name, asyntaxinfo* info)
     return attr;
 }
 
-void link_attribute(Entry& entry, Attribute& attr, const sorted_place& place)
+void link_attribute(Entry& entry, Attribute& attr, const sorted_neighbours& place)
 {
     attr.a_sorted_prev = place.below;
     attr.a_sorted_next = place.above;
@@ -128,8 +137,23 @@ void link_attribute(Entry& entry, Attribute& attr, const sorted_place& place)
     entry.e_attrs_tail = &attr;
 }
 
+// Keeps the index true to a new record, or makes it where a walk was long. Without memory the entry goes on without.
+void index_attribute(Entry& entry, Attribute& attr, int passed)
+{
+    if (entry.e_index != nullptr) {
+        if (!entry.e_index->add(attr)) {
+            delete std::exchange(entry.e_index, nullptr);
+        }
+    } else if (passed > longest_walk) {
+        entry.e_index = attr_index::build(entry);
+    }
+}
+
 void unlink_attribute(Entry& entry, Attribute& attr)
 {
+    if (entry.e_index != nullptr) {
+        entry.e_index->remove(attr);
+    }
     (attr.a_sorted_prev == nullptr ? entry.e_sorted_low : attr.a_sorted_prev->a_sorted_next) = attr.a_sorted_next;
     (attr.a_sorted_next == nullptr ? entry.e_sorted_high : attr.a_sorted_next->a_sorted_prev) = attr.a_sorted_prev;
     (attr.a_prev == nullptr ? entry.e_attrs : attr.a_prev->a_next) = attr.a_next;
@@ -194,7 +218,8 @@ int flatattr_insert(Entry* entry, asyntaxinfo* info, const char* name, Attribute
         return LDAP_NO_MEMORY;
     }
     if (place.found == nullptr) {
-        link_attribute(*entry, **attr, place);
+        link_attribute(*entry, **attr, place.neighbours);
+        index_attribute(*entry, **attr, place.passed);
         fill_slot(*entry, **attr);
     }
     return LDAP_SUCCESS;
@@ -204,6 +229,10 @@ Attribute* flatattr_find(const Entry* entry, const asyntaxinfo* info, const char
 {
     if (entry == nullptr || info == nullptr) {
         return nullptr;
+    }
+    if (entry->e_index != nullptr) {
+        Attribute* const found = entry->e_index->find(attr_key(info, nullptr), tag);
+        return found != nullptr && found->a_info == info ? found : nullptr;
     }
     Attribute* attr = entry->e_attrs;
     while (attr != nullptr && !is_version(*attr, info, tag)) {

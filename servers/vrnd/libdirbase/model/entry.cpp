@@ -9,6 +9,7 @@
 #include "libraries/libber/ldap_result.h"
 #include "libraries/libmsg/debug_log.h"
 #include "servers/vrnd/libdirbase/model/attr_ids.h"
+#include "servers/vrnd/libdirbase/model/attr_index.h"
 #include "servers/vrnd/libdirbase/model/attr_value_tree.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/value_compare.h"
@@ -69,6 +70,7 @@ void entry_free(Entry* entry)
     for (berval** values : entry->e_backend_values) {
         ber_bvecfree(values);
     }
+    delete entry->e_index;
     std::free(entry->e_dn);
     std::free(entry->e_norm_dn);
     std::free(entry->e_checksum);

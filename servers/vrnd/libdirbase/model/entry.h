@@ -8,6 +8,7 @@
 #include "libraries/libber/berval.h"
 #include "libraries/libber/ldap_mod.h"
 
+class attr_index;
 struct Attribute;
 struct avl_node;
 
@@ -43,6 +44,8 @@ struct Entry {
     // Numbers of values as the back end knows them: -1 after values were merged, 0 after the attribute was deleted.
     std::int64_t e_member_count;
     std::int64_t e_uniquemember_count;
+
+    attr_index* e_index;  // the library's own: made once an entry has very many attributes, else null
 };
 
 extern "C" {

@@ -165,6 +165,38 @@ TEST_F(Attributes, ListsKeepBothOrdersWhateverIsAddedAndDeleted)
     }
 }
 
+// The lists of an entry with very many attributes, by whose index records are found, against those of one whose index is
+// taken away at every step.
+TEST_F(Attributes, AnIndexChangesNothingButTheTime)
+{
+    std::vector<std::string> names = {"cn", "sn", "member", "ref", "objectClass", "description", "2.5.4.3", "SN"};
+    for (std::size_t i = names.size(); i < 400; ++i) {
+        names.push_back((i % 2 == 0 ? names[i % 6] + ";lang-" : "None") + static_cast<char>('a' + i % 26) +
+                        static_cast<char>('A' + i / 26));
+    }
+    std::mt19937 random(5);
+    test_entry indexed;
+    test_entry plain;
+    for (int i = 0; i < 6000; ++i) {
+        const char* name = names[random() % names.size()].c_str();
+        if (random() % 5 < 3) {
+            ASSERT_EQ(indexed.merge(name, {"cn=x"}, 1, 0), 0) << name;
+            plain.merge(name, {"cn=x"}, 1, 0);
+        } else if (info_of(name) != nullptr) {
+            ASSERT_EQ(attr_delete(&indexed, name, nullptr), attr_delete(&plain, name, nullptr)) << name;
+        }
+        delete std::exchange(plain.e_index, nullptr);
+        const Attribute* found = indexed.find(name);
+        const Attribute* expected = plain.find(name);
+        ASSERT_STREQ(found == nullptr ? "" : found->a_type, expected == nullptr ? "" : expected->a_type);
+        if (i % 50 == 0) {
+            ASSERT_EQ(in_order_of_names(indexed), in_order_of_names(plain));
+            ASSERT_EQ(in_order_of_arrival(indexed), in_order_of_arrival(plain));
+        }
+    }
+    EXPECT_NE(indexed.e_index, nullptr);
+}
+
 TEST_F(Attributes, WalksAndCounts)
 {
     test_entry entry;

@@ -11,6 +11,7 @@
 
 #include "servers/vrnd/libdirbase/base/password_values.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
+#include "servers/vrnd/libdirbase/model/attr_index.h"
 #include "servers/vrnd/libdirbase/model/attr_value_tree.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_api.h"
@@ -113,6 +114,7 @@ struct test_entry : Entry {
         for (Attribute* attr = e_attrs; attr != nullptr;) {
             attr_free(std::exchange(attr, attr->a_next));
         }
+        delete e_index;
     }
     test_entry(const test_entry&) = delete;
     test_entry& operator=(const test_entry&) = delete;
