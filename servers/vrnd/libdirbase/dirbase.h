@@ -2,8 +2,10 @@
 #pragma once
 
 #include "libraries/libavl/avl.h"
+#include "libraries/libber/ber_element.h"
 #include "libraries/libber/berval.h"
 #include "libraries/libber/ldap_control.h"
+#include "libraries/libber/ldap_error.h"
 #include "libraries/libber/ldap_mod.h"
 #include "libraries/libber/ldap_result.h"
 #include "servers/vrnd/libcsgl/csgl_exception.h"
