@@ -13,8 +13,9 @@ berval* ber_bvdup(const berval* value)
         return nullptr;
     }
     const unsigned long length = value->bv_val == nullptr ? 0 : value->bv_len;
-    if (length == ULONG_MAX)  // no room for the zero byte
+    if (length == ULONG_MAX) {  // no room for the zero byte
         return nullptr;
+    }
     auto* copy = static_cast<berval*>(std::malloc(sizeof(berval)));
     auto* bytes = static_cast<char*>(std::malloc(length + 1));
     if (copy == nullptr || bytes == nullptr) {

@@ -6,8 +6,9 @@
 
 extern "C" char* ldap_getenv(const char* name)
 {
-    if (name == nullptr)
+    if (name == nullptr) {
         return nullptr;
+    }
     const char* value = std::getenv(name);
     return value == nullptr ? nullptr : ::strdup(value);
 }

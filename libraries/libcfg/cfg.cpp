@@ -81,11 +81,20 @@ bool is_empty(const char* text)
     return text == nullptr || *text == '\0';
 }
 
+// Flags are turned on once something has failed, of which they are to tell: what is kept with the handle stays. False for
+// another option.
+bool set_flag(cfg_handle& cfg, int option, const void* value)
+{
+    switch (option) {
+    case CFG_OPT_DUMP: cfg.dump = value != nullptr; return true;
+    case CFG_OPT_DUMP_PLACE: cfg.dump_place = value != nullptr; return true;
+    default: return false;
+    }
+}
+
 cfg_failure set_option(cfg_handle& cfg, int option, const void* value)
 {
     switch (option) {
-    case CFG_OPT_DUMP: cfg.dump = value != nullptr; return success;
-    case CFG_OPT_DUMP_PLACE: cfg.dump_place = value != nullptr; return success;
     case CFG_OPT_FILE:
         if (is_empty(static_cast<const char*>(value))) {
             return bad_argument;
@@ -251,6 +260,9 @@ cfg_handle* cfg_init(const char* host, int port)
 
 int cfg_set_option(cfg_handle* cfg, int option, const void* value)
 {
+    if (cfg != nullptr && set_flag(*cfg, option, value)) {
+        return LDAP_SUCCESS;
+    }
     return run(cfg, [&] { return set_option(*cfg, option, value); });
 }
 

@@ -135,9 +135,11 @@ TEST(CfgFile, WhatIsRefusedIsNamedByReasonLineAndFile)
         cfg_dump_exception(cfg.get());  // switched off
         cfg_perror(cfg.get(), "step");
         const std::string place = " in line " + std::to_string(line) + " of file " + file;
-        cfg_set_option(cfg.get(), CFG_OPT_DUMP, CFG_OPT_ON);  // the code is the option's now
+        EXPECT_EQ(cfg_set_option(cfg.get(), CFG_OPT_DUMP, CFG_OPT_ON), 0);  // once it has failed
+        EXPECT_EQ(cfg_set_option(cfg.get(), CFG_OPT_DUMP_PLACE, CFG_OPT_ON), 0);
         cfg_dump_exception(cfg.get());
-        EXPECT_EQ(log.texts(), std::vector{"Error - step: "s + reason + place + ", rc=" + std::to_string(code) + "\n"});
+        const std::string told = ": "s + reason + place + ", rc=" + std::to_string(code) + "\n";
+        EXPECT_EQ(log.texts(), (std::vector{"Error - step" + told, "Error - cfg_dump_exception" + told}));
         EXPECT_EQ(found(cfg, "", CFG_SCOPE_SUB, "objectclass=*", true), "1") << "nothing is bound";
     }
 }

@@ -100,7 +100,7 @@ int delete_values_from_entry(Entry* entry, const LDAPMod* mod)
     if (entry == nullptr || mod == nullptr || mod->mod_type == nullptr) {
         return LDAP_NO_SUCH_ATTRIBUTE;
     }
-    if (mod->mod_bvalues == nullptr) {
+    if (mod->mod_bvalues == nullptr || *mod->mod_bvalues == nullptr) {
         debug_trace("delete_values_from_entry: removing entire attribute %s\n", mod->mod_type);
         return attr_delete(entry, mod->mod_type, nullptr) == 0 ? LDAP_SUCCESS : LDAP_NO_SUCH_ATTRIBUTE;
     }
@@ -109,17 +109,15 @@ int delete_values_from_entry(Entry* entry, const LDAPMod* mod)
         debug_error("delete_values_from_entry: could not find attribute %s\n", mod->mod_type);
         return LDAP_NO_SUCH_ATTRIBUTE;
     }
-    int result = LDAP_SUCCESS;
     for (berval** value = mod->mod_bvalues; *value != nullptr; ++value) {
         const std::int64_t place = place_of(*attr, **value);
-        if (place < attr->a_numvals) {
-            remove_at(*attr, place);
-        } else {
+        if (place == attr->a_numvals) {
             debug_error("delete_values_from_entry: could not find value for attr %s\n", mod->mod_type);
-            result = LDAP_NO_SUCH_ATTRIBUTE;
+            return LDAP_NO_SUCH_ATTRIBUTE;
         }
+        remove_at(*attr, place);
     }
-    return result;
+    return LDAP_SUCCESS;
 }
 
 int free_attrtree(avl_node* node)

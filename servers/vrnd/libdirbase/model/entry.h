@@ -17,8 +17,8 @@ constexpr std::uint8_t ENTRY_IN_CACHE = 0x01;              // the entry belongs 
 constexpr std::uint8_t ENTRY_MEMBER_TRIMMED = 0x02;        // the text that it was read from had `member` lines, trimmed
 constexpr std::uint8_t ENTRY_UNIQUEMEMBER_TRIMMED = 0x04;  // the same for `uniquemember`
 
-// All pointers are owned by the entry and come from malloc, but for the slots and the back end's word. A new entry is
-// zeroed.
+// All pointers are owned by the entry and come from malloc, but for the slots, the back end's word and the index. A new
+// entry is zeroed.
 struct Entry {
     char* e_dn;          // as given
     Attribute* e_attrs;  // in order of arrival: the first
@@ -66,8 +66,8 @@ DIRBASE_EXPORT bool verify_attribute(const Entry* entry, const char* name, const
 // tree keeps them: it is
 // the caller's to mend, by delete_valuetree_value. An attribute may be left with no values.
 //
-// Returns LDAP_SUCCESS, or LDAP_NO_SUCH_ATTRIBUTE for an attribute or value that isn't there; the values that are there
-// are gone in any case.
+// Returns LDAP_SUCCESS, or LDAP_NO_SUCH_ATTRIBUTE for an attribute or value that isn't there; the values before it are
+// gone then, and those behind it are left.
 DIRBASE_EXPORT int delete_values_from_entry(Entry* entry, const LDAPMod* mod);
 
 // Releases the nodes of a value tree with their values. Null does nothing. Returns 0.

@@ -102,10 +102,15 @@ void free_bv_chain(LDAPMod* first)
     free_ldmll(first);
 }
 
-// Copies a chain to *end, record by record. False when memory ran out, with what was copied in place.
+// Copies a chain to *end, record by record; the end may be the chain's own, so its last record is found first. False when
+// memory ran out, with what was copied in place.
 bool append_copies(const LDAPMod* first, LDAPMod** end)
 {
-    for (const LDAPMod* mod = first; mod != nullptr; mod = mod->mod_next) {
+    const LDAPMod* last = first;
+    while (last != nullptr && last->mod_next != nullptr) {
+        last = last->mod_next;
+    }
+    for (const LDAPMod* mod = first; mod != nullptr; mod = mod == last ? nullptr : mod->mod_next) {
         *end = copy_bv_mod(*mod);
         if (*end == nullptr) {
             return false;

@@ -60,9 +60,10 @@ DIRBASE_EXPORT extern Entry* ldcf_api_schema_entry_g;
 // (the latter for types of binary syntax only). Null for a name that the schema lacks, a null or empty name, and a type
 // that can't have a record.
 //
-//   base_out  may be null. For a name that the cache doesn't hold it receives the name without its language tags, a text for
-//             the caller to free(), or null when it has none, its tags are too long (240 bytes) or memory ran out. For a name
-//             that the cache holds, one with ";binary", and a null or empty one it is left alone: the caller sets it to null.
+//   base_out  may be null. For a name that the cache doesn't hold it receives the name without its language tags, a
+//             text for the caller to free(), or null when it has none, its tags are too long (240 bytes) or memory ran
+//             out. For a name that the cache holds, one with ";binary", and a null or empty one it is left alone: the
+//             caller sets it to null.
 //
 // A name that the cache holds costs no allocation (RFC 4512 section 2.5, RFC 3866).
 DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info(const char* name, char** base_out);
@@ -105,8 +106,7 @@ DIRBASE_EXPORT void free_qualified_table_name(char* name);
 // is there already or that have no record. At start-up or under the write side of the schema lock.
 DIRBASE_EXPORT void ldcf_api_load_attr_hash(void);
 
-// ---- predicates: false for a name that the schema lacks
-// ---------------------------------------------------------------
+// ---- predicates: false for a name that the schema lacks -------------------------------------------------------------
 
 DIRBASE_EXPORT bool ldcf_api_is_langtag_attr(const char* name);      // may carry language tags
 DIRBASE_EXPORT bool ldcf_api_is_unique_attr(const char* name);       // may be made unique over the directory
@@ -120,9 +120,10 @@ DIRBASE_EXPORT bool ldcf_api_is_binary_syntax(const char* oid);      // takes th
 // False for the few attribute types that can't carry language tags, by OID.
 DIRBASE_EXPORT bool checkIfLangTagAttrByOid(const char* oid);
 
-// ---- lists: primary names, a new null-terminated array for charray_free
-// ------------------------------------------------ In the order of the schema's keys: OIDs come first, so that of the
-// OIDs. Null when memory ran out. What a list without members gives is said with it.
+// ---- lists: primary names, a new null-terminated array for charray_free ---------------------------------------------
+//
+// In the order of the schema's keys: OIDs come first, so that of the OIDs. Null when memory ran out. What a list
+// without members gives is said with it.
 
 DIRBASE_EXPORT char** ldcf_api_get_langtag_attrs(void);         // null
 DIRBASE_EXPORT char** ldcf_api_get_nonlangtag_attrs(void);      // null
