@@ -6,6 +6,8 @@
 
 #include <cstdint>
 
+class ldcf_attrtype_;
+
 // A column of the relational store.
 struct rdbm_col_info {
     char* name;
@@ -40,6 +42,8 @@ struct asyntaxinfo {
     std::uint8_t secure_connection;       // 1: only over a secure connection
     std::int32_t return_value;            // 0 cleartext, 1 encrypted, 2 type only
     std::uint8_t non_matchable;           // 1: values aren't matched
+
+    const ldcf_attrtype_* type;  // the definition that the record belongs to
 };
 
 // One object class.

@@ -6,11 +6,10 @@
 
 #include "libraries/libber/ldap_result.h"
 #include "libraries/libmsg/debug_log.h"
-#include "libraries/libvrnutil/vrn_text.h"
-#include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/oid_prefix.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_binary_name.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_hash_index.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_rdbm.h"
 
@@ -19,9 +18,6 @@ std::int32_t ldcf_api_schema_check_g = 2;
 Entry* ldcf_api_schema_entry_g = nullptr;
 
 namespace {
-
-constexpr char binary_suffix[] = ";binary";
-constexpr std::size_t binary_suffix_length = sizeof(binary_suffix) - 1;
 
 // Runs one step of the life cycle; whatever goes wrong in it ends here.
 template <typename Step>
@@ -41,23 +37,10 @@ const char* skip_oid_prefix(const char* name)
     return has_oid_prefix(name) ? name + oid_prefix_length : name;
 }
 
-// Whether a name ends in ";binary", with something in front of it.
-bool ends_in_binary(const char* name, std::size_t length)
-{
-    return length > binary_suffix_length && (name[length - 1] | 0x20) == 'y' &&
-           vrn_strcasecmp(name + length - binary_suffix_length, binary_suffix) == 0;
-}
-
-// A copy of such a name without that; null when memory ran out.
-heap_text without_binary(const char* name, std::size_t length)
-{
-    return heap_text(strndup(name, length - binary_suffix_length));
-}
-
-// The record of such a name's type, if its syntax is binary.
+// The record of the type of a name with ";binary", if its syntax is that.
 [[gnu::noinline]] asyntaxinfo* binary_info(const char* name, std::size_t length)
 {
-    const heap_text plain = without_binary(name, length);
+    const heap_text plain = ldcf_without_binary(name, length);
     asyntaxinfo* info =
         plain == nullptr ? nullptr : ldcf_attrtype_get_info(ldcf_schema_g->attribute_types, plain.get());
     return info != nullptr && info->syntax == SC_BIN ? info : nullptr;
@@ -214,7 +197,7 @@ asyntaxinfo* ldcf_api_attr_get_info(const char* name, char** base_out)
     }
     name = skip_oid_prefix(name);
     const std::size_t length = std::strlen(name);
-    if (ends_in_binary(name, length)) {
+    if (ldcf_ends_in_binary(name, length)) {
         return binary_info(name, length);
     }
     if (const ldcf_hash_tbl_entry* node = ldcf_find_node(name, length); node != nullptr) {
@@ -232,10 +215,10 @@ const char* ldcf_api_attr_get_oid(const char* name)
     name = skip_oid_prefix(name);
     const auto& map = ldcf_schema_g->attribute_types;
     const std::size_t length = std::strlen(name);
-    if (!ends_in_binary(name, length)) {
+    if (!ldcf_ends_in_binary(name, length)) {
         return ldcf_attrtype_get_oid(map, name);
     }
-    const heap_text plain = without_binary(name, length);
+    const heap_text plain = ldcf_without_binary(name, length);
     return plain == nullptr ? nullptr : ldcf_attrtype_get_oid(map, plain.get());
 }
 

@@ -54,6 +54,16 @@ DIRBASE_EXPORT std::int32_t ldcf_api_get_schema_check(void);
 // The active schema as the entry "cn=schema", kept by the schema back end; null when it must be built again.
 DIRBASE_EXPORT extern Entry* ldcf_api_schema_entry_g;
 
+// A schema as that entry: its classes, its attribute types in the standard and the extended form with all defaults
+// filled in, its syntaxes and its matching rules, each definition as one value (RFC 4512, section 4.2). The schema is
+// complete. Returns a new entry for entry_free, or null when memory ran out.
+DIRBASE_EXPORT Entry* ldcf_api_schema2entry(const ldcf_schema* schema);
+
+// Adds one text value (null counts as the empty one) to an entry, by attr_merge, with its results.
+//
+//   flag  1: a value that is there already is passed over, and the value tree is kept or built; 0: neither
+DIRBASE_EXPORT int add_attr_to_entry(Entry* entry, const char* type, const char* text, int flag);
+
 // ---- look-ups -----------------------------------------------------------------------------------------------------
 
 // The record of an attribute type by name or OID, with or without "oid." in front, a language tag or ";binary" behind

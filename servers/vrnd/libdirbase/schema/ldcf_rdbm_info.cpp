@@ -372,6 +372,7 @@ asyntaxinfo* ldcf_rdbm::fill_asyntaxinfo(const ldcf_attrtype& attribute)
         free_record(info);
         return nullptr;
     }
+    info->type = attribute.get();
     return info;
 }
 
