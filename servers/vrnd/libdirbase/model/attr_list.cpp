@@ -1,7 +1,7 @@
 // The records of an entry on their two lists: making, finding, walking and removing them (attribute.h).
 //
-// In the sorted list a record stands by its key (attr_index.h). So all versions of a known attribute stand side by side,
-// and a walk that looks for one can't pass it by. An entry in which such a walk gets long is given an index.
+// In the sorted list a record stands by its key (attr_index.h). So all versions of a known attribute stand side by
+// side, and a walk that looks for one can't pass it by. An entry in which such a walk gets long is given an index.
 #include <cstddef>
 #include <cstdlib>
 #include <cstring>
@@ -13,6 +13,7 @@
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
 #include "servers/vrnd/libdirbase/model/attr_ids.h"
 #include "servers/vrnd/libdirbase/model/attr_index.h"
+#include "servers/vrnd/libdirbase/model/attr_records.h"
 #include "servers/vrnd/libdirbase/model/attr_value_tree.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
@@ -117,13 +118,20 @@ sorted_place find_place(const Entry& entry, const asyntaxinfo* info, const char*
 Attribute* new_attribute(const char* name, asyntaxinfo* info)
 {
     const std::size_t size = std::strlen(name) + 1;
-    auto* attr = static_cast<Attribute*>(std::calloc(1, sizeof(Attribute) + size));
-    if (attr != nullptr) {
-        attr->a_type = static_cast<char*>(std::memcpy(attr + 1, name, size));
-        attr->a_syntax = static_cast<std::int32_t>(info == nullptr ? SC_CIS : info->syntax);
-        attr->a_info = info;
+    const std::size_t room = (size + named_attribute::unit - 1) / named_attribute::unit * named_attribute::unit;
+    auto* made = static_cast<named_attribute*>(std::malloc(sizeof(named_attribute) + room));
+    if (made == nullptr) {
+        return nullptr;
     }
-    return attr;
+    *made = {};
+    Attribute& attr = made->attribute;
+    attr.a_type = made->name();
+    std::memset(attr.a_type + room - named_attribute::unit, 0, named_attribute::unit);
+    std::memcpy(attr.a_type, name, size);
+    attr.a_syntax = static_cast<std::int32_t>(info == nullptr ? SC_CIS : info->syntax);
+    attr.a_info = info;
+    made->type_length = static_cast<std::size_t>(strchrnul(name, ':') - name);
+    return &attr;
 }
 
 void link_attribute(Entry& entry, Attribute& attr, const sorted_neighbours& place)

@@ -10,6 +10,7 @@
 #include "servers/vrnd/libdirbase/base/oid_prefix.h"
 #include "servers/vrnd/libdirbase/model/attr_ids.h"
 #include "servers/vrnd/libdirbase/model/attr_names.h"
+#include "servers/vrnd/libdirbase/model/attr_records.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
 #include "servers/vrnd/libdirbase/model/value_add.h"
@@ -76,6 +77,28 @@ bool is_too_long(const char* tag)
 
 }  // namespace
 
+int attr_merge_record(Entry& entry, const char* name, asyntaxinfo* info, Attribute** attr)
+{
+    forget_count(entry, info);
+    const char* const tag = find_language_tag(name);
+    if (is_too_long(tag)) {
+        return refuse_tag("Error - attr_merge: parse_language_tags() failed.\n");
+    }
+    if (tag != nullptr && is_valid_language_tag(tag) == 0) {
+        return refuse_tag("Error - attr_merge: invalid language tag.\n");
+    }
+    return insert_by_name(entry, name, tag, info, attr);
+}
+
+int attr_merge_values(Attribute& attr, berval** values, int drop_duplicates, int tree_mode)
+{
+    if (drop_duplicates == 0 && tree_mode == 0) {
+        return value_add(&attr.a_vals, values, &attr);
+    }
+    return value_add_normalize(&attr.a_vals, values, static_cast<std::uint32_t>(attr.a_syntax), &attr, drop_duplicates,
+                               tree_mode == 2 ? 1 : 0);
+}
+
 extern "C" {
 
 int attr_merge(Entry* entry, const char* name, berval** values, int drop_duplicates, int tree_mode, asyntaxinfo* info)
@@ -86,24 +109,9 @@ int attr_merge(Entry* entry, const char* name, berval** values, int drop_duplica
     if (info == nullptr) {
         info = ldcf_api_attr_get_info(name, nullptr);
     }
-    forget_count(*entry, info);
-    const char* const tag = find_language_tag(name);
-    if (is_too_long(tag)) {
-        return refuse_tag("Error - attr_merge: parse_language_tags() failed.\n");
-    }
-    if (tag != nullptr && is_valid_language_tag(tag) == 0) {
-        return refuse_tag("Error - attr_merge: invalid language tag.\n");
-    }
     Attribute* attr = nullptr;
-    const int result = insert_by_name(*entry, name, tag, info, &attr);
-    if (result != LDAP_SUCCESS) {
-        return result;
-    }
-    if (drop_duplicates == 0 && tree_mode == 0) {
-        return value_add(&attr->a_vals, values, attr);
-    }
-    return value_add_normalize(&attr->a_vals, values, static_cast<std::uint32_t>(attr->a_syntax), attr, drop_duplicates,
-                               tree_mode == 2 ? 1 : 0);
+    const int result = attr_merge_record(*entry, name, info, &attr);
+    return result != LDAP_SUCCESS ? result : attr_merge_values(*attr, values, drop_duplicates, tree_mode);
 }
 
 int attr_merge_fast(Entry* entry, const char* name, berval** values, std::int64_t /*old_count*/, std::int64_t added,

@@ -32,6 +32,7 @@ std::int64_t place_of(const Attribute& attr, const berval& value)
 
 void remove_at(Attribute& attr, std::int64_t place)
 {
+    attr_free_decodedvals(&attr);
     ber_bvfree(attr.a_vals[place]);
     // The null pointer at the end moves up with the values.
     std::memmove(attr.a_vals + place, attr.a_vals + place + 1,

@@ -63,8 +63,8 @@ DIRBASE_EXPORT void entry_free(Entry* entry);
 DIRBASE_EXPORT bool verify_attribute(const Entry* entry, const char* name, const char* value, std::size_t length);
 
 // Removes the values of a modification, which are bervals, or for one without values the whole attribute. The value
-// tree keeps them: it is
-// the caller's to mend, by delete_valuetree_value. An attribute may be left with no values.
+// tree keeps them: it is the caller's to mend, by delete_valuetree_value. Decoded values are dropped with the first
+// that goes. An attribute may be left with no values.
 //
 // Returns LDAP_SUCCESS, or LDAP_NO_SUCH_ATTRIBUTE for an attribute or value that isn't there; the values before it are
 // gone then, and those behind it are left.
