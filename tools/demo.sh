@@ -1,10 +1,10 @@
 #!/bin/sh
-# Shows the main job on the schema that ships: load it, explain it, change it, see what a change may not do, and put names
-# into their normal form by it.
+# Shows the main job on the data that ships: which entries of an LDIF file a server would take, and why it would refuse
+# the others; the forms of an entry; the changes between two files; and the schema and the DNs that all this rests on.
 #
 #   tools/demo.sh DIRBASE     DIRBASE is the path of the tool
 #
-# Everything is done on a copy in a temporary folder, which is removed at the end.
+# Everything is done in a temporary folder, which is removed at the end.
 set -eu
 
 if [ $# -ne 1 ] || [ ! -x "$1" ]; then
@@ -31,8 +31,8 @@ run()
     "$dirbase" "$@"
 }
 
-# The same for a command that must find fault.
-run_refused()
+# The same for a command that must find something.
+run_finding()
 {
     status=0
     run "$@" 2>&1 || status=$?
@@ -40,67 +40,58 @@ run_refused()
     [ "$status" -eq 1 ]
 }
 
-cd "$root"
+cd "$root/share/sample"
 
-heading 'The schema that ships loads, and is whole'
-run schema check --schema share/schema
+heading 'An organisation of 358 entries: a server would take them all'
+run ldif check organisation.ldif
 
-heading 'What inetOrgPerson comes to: its superclasses, and where each attribute is from (abridged)'
-run schema show inetOrgPerson --schema share/schema >"$work/shown"
-sed -e '16,$ { /telephone/b' -e '/userPass/b' -e '/file/!d' -e '}' "$work/shown"
+heading 'One entry for each kind of fault: a server would refuse them all (abridged to every third)'
+run_finding ldif check --rejects "$work/rejects.ldif" faults.ldif >"$work/found"
+sed -e "s|$work/||" "$work/found" |
+    awk '/^[0-9]+ entries/ { counts = NR } counts ? NR < counts + 6 || /^\(/ : NR == 1 || NR % 3 == 0'
 
+heading 'The first of the refused entries, as it stood, with the reason'
+sed '/^$/q' "$work/rejects.ldif"
+
+heading 'A group in its three forms: LDIF, without its members, and BER as it goes to clients (abridged)'
+{ echo 'version: 1'; echo; sed -n '/^dn: cn=Choir,/,/^$/p' organisation.ldif; } >"$work/choir.ldif"
 cd "$work"
+run ldif print choir.ldif
+echo
+run ldif print --form no-members choir.ldif
+echo
+run ldif print --form ber choir.ldif >ber
+sed -e '5,$d' ber
+echo '...'
 
-heading 'A new attribute type, with the way it is kept in the store, and a class that uses it'
-cp -R "$root/share/schema" before
+heading 'The choir loses a member, is described, and has a room: what a server must be told'
+sed -e '/^uniqueMember: uid=vnettlegarth/d' -e 's/^cn: Choir/cn: CHOIR/' \
+    -e '/^cn: /a description: Sings in the glass house, for the echo' choir.ldif >choir-new.ldif
+cat >>choir-new.ldif <<'END'
+dn: cn=Choir Room, ou=Rooms, o=Quillhaven Works
+objectClass: room
+END
+run_finding ldif diff choir.ldif choir-new.ldif
+
+heading 'What an entry may hold is told by the schema, which can be asked, printed, compared and changed'
+run schema check --schema "$root/share/schema"
+echo
+run schema show groupOfUniqueNames --schema "$root/share/schema"
+
+heading 'A change is made whole or not at all: this class has subclasses'
 cp -R "$root/share/schema" schema
 chmod -R u+w schema
-cat >badge.at <<'END'
-attributeTypes {
-    ( 1.3.6.1.4.1.32473.1.1 NAME ( 'demoBadge' 'demoBadgeNumber' ) DESC 'Number on the badge of a guest'
-        SUP name SINGLE-VALUE )
-}
-XANattributeTypes {
-    ( 1.3.6.1.4.1.32473.1.1 DBNAME ( 'demo_badge' 'demo_badge' ) ACCESS-CLASS SENSITIVE LENGTH 32 EQUALITY )
-}
-END
-cat >guest.oc <<'END'
-objectClasses {
-    ( 1.3.6.1.4.1.32473.2.1 NAME 'demoGuest' DESC 'Guest of the house' SUP person STRUCTURAL MUST demoBadge )
-}
-END
-cat badge.at guest.oc
-echo
-run schema modify --schema schema add badge.at
-run schema modify --schema schema add guest.oc
+echo "objectClasses { ( 2.5.6.6 NAME 'person' ) }" >person.oc
+run_finding schema modify --schema schema delete person.oc
 
-heading 'What changed on disk: one file, the one that takes additions'
-diff -r -u --label before --label after before schema | grep -v '^diff' || true
-
-heading 'The attribute type, with what it inherits, and how the server holds its values'
-run schema show demoBadge --schema schema
-
-heading 'How the two directories differ'
-run_refused schema diff before schema
-
-heading 'Attribute types by a property: those of the configuration'
-run schema list config --schema schema
-
-heading 'While the class uses it, the attribute type stays'
-run_refused schema modify --schema schema delete badge.at
-
-heading 'And the schema still loads, with one attribute type and one class more'
-run schema check --schema schema
-
-heading 'One DN in five spellings, and one that is refused'
+heading 'One DN in four spellings, and one that is refused'
 cat >names <<'END'
 cn=Bob Smith,o=Acme\, Inc.,c=us
 CN = Bob Smith , O="Acme, Inc." ; C=us
-commonName=Bob Smith, organizationName=Acme\2C Inc., countryName=us
-2.5.4.3=Bob Smith,oid.2.5.4.10=Acme\, Inc.,2.5.4.6=us
+2.5.4.3=Bob Smith,oid.2.5.4.10=Acme\2C Inc.,countryName=us
 cn=#0409426F6220536D697468,o=Acme\2c Inc.,c=us
 cn=Bob Smith,o=Acme, Inc.,c=us
 END
 cat names
 echo
-run_refused dn normalize --schema schema - <names
+run_finding dn normalize --schema schema - <names

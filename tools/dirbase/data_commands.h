@@ -21,6 +21,9 @@ int compare_dns(const common_options& common, const std::string& first, const st
 // are meant.
 int normalize_values(const common_options& common, const std::string& syntax, const std::vector<std::string>& values);
 
+// Why a DN is refused, for one that dn_normalize_esc refuses: "34 invalidDNSyntax at byte 2: ...".
+std::string refusal_of_dn(const std::string& dn);
+
 // "34 invalidDNSyntax", for the results that the data model gives (RFC 4511, appendix A).
 std::string result_words(int result);
 

@@ -196,9 +196,16 @@ std::string result_words(int result)
     case LDAP_UNDEFINED_TYPE: return "17 undefinedAttributeType";
     case LDAP_INVALID_SYNTAX: return "21 invalidAttributeSyntax";
     case LDAP_INVALID_DN_SYNTAX: return "34 invalidDNSyntax";
+    case LDAP_OBJECT_CLASS_VIOLATION: return "65 objectClassViolation";
+    case LDAP_OTHER: return "80 other";
     case LDAP_NO_MEMORY: return "90 no memory";
     default: return std::to_string(result);
     }
+}
+
+std::string refusal_of_dn(const std::string& dn)
+{
+    return verdict_on(dn, *normalized(dn, false), false).text();
 }
 
 int ask_of_dns(const common_options& common, dn_question question, const std::vector<std::string>& dns, bool light)

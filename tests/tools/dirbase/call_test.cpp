@@ -34,6 +34,10 @@ TEST(ToolCall, HelpAndVersionAreEverywhere)
         {"dn"},
         {"dn", "normalize"},
         {"dn", "compare"},
+        {"ldif"},
+        {"ldif", "check"},
+        {"ldif", "print"},
+        {"ldif", "diff"},
     };
     for (words call : calls) {
         SCOPED_TRACE(testing::PrintToString(call));

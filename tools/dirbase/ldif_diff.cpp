@@ -1,0 +1,375 @@
+// dirbase ldif diff
+//
+// Both files are held as entries, found by their normal DN. The changes come in an order in which a server takes them:
+// entries that go, leaves first; entries that change; entries that come, parents first.
+#include <algorithm>
+#include <cstring>
+#include <new>
+#include <unordered_map>
+#include <unordered_set>
+
+#include <strings.h>
+
+#include "libraries/libber/ldap_result.h"
+#include "libraries/libldif/line64.h"
+#include "servers/vrnd/libdirbase/base/syntax_codes.h"
+#include "servers/vrnd/libdirbase/model/attr_value_tree.h"
+#include "servers/vrnd/libdirbase/model/attribute.h"
+#include "servers/vrnd/libdirbase/model/language_tag.h"
+#include "servers/vrnd/libdirbase/model/value_compare.h"
+#include "tools/dirbase/ldif_commands.h"
+#include "tools/dirbase/ldif_reader.h"
+#include "tools/dirbase/text_file.h"
+
+namespace dirbase_tool {
+
+namespace {
+
+std::string_view bytes_of(const berval& value)
+{
+    return {value.bv_val, value.bv_len};
+}
+
+void append_line(std::string& text, const char* type, std::string_view value)
+{
+    const std::size_t old_size = text.size();
+    text.resize(old_size + ldif_line_room(std::strlen(type), value.size()));
+    char* end = text.data() + old_size;
+    put_type_and_value(&end, type, value.data(), value.size());
+    text.resize(static_cast<std::size_t>(end - text.data()));
+}
+
+// The entries of one file, in its order.
+class ldif_side {
+public:
+    explicit ldif_side(const std::string& file);
+
+    const std::vector<entry_pointer>& entries() const { return entries_; }
+    const Entry* find(std::string_view normal_dn) const
+    {
+        const auto found = by_dn_.find(normal_dn);
+        return found == by_dn_.end() ? nullptr : found->second;
+    }
+    bool is_whole() const { return whole_; }
+
+private:
+    void take(std::string_view entry, std::size_t line, const std::string& source);
+
+    std::vector<entry_pointer> entries_;
+    std::unordered_map<std::string_view, const Entry*> by_dn_;
+    ldif_text text_;
+    bool whole_ = true;
+};
+
+ldif_side::ldif_side(const std::string& file)
+{
+    ldif_reader reader(file, false);
+    for (ldif_batch batch; reader.next(batch);) {
+        if (batch.too_large != 0) {
+            throw tool_failure(status_unusable, source_name(file), static_cast<int>(batch.first_line),
+                               "an entry of more than 16 MiB");
+        }
+        const schema_reader guard;
+        std::string_view rest = batch.text;
+        for (std::size_t line = batch.first_line; !rest.empty();) {
+            const std::string_view entry = take_entry(rest);
+            take(entry, line, source_name(file));
+            line += static_cast<std::size_t>(std::count(entry.begin(), entry.end(), '\n'));
+        }
+    }
+}
+
+void ldif_side::take(std::string_view entry, std::size_t line, const std::string& source)
+{
+    ldif_fault_list faults;
+    entry_pointer made;
+    if (text_.parse(entry, line, faults) == ldif_text::content::entry && faults.empty()) {
+        made = make_entry(text_, true, faults);
+    }
+    if (made != nullptr && !by_dn_.emplace(made->e_norm_dn, made.get()).second) {
+        faults.add(ldif_fault_kind::second_dn, text_.line(), "", "the file has this entry already");
+    }
+    for (const ldif_fault& fault : faults.kept()) {
+        tell(line_of(fault, source, text_.dn() == nullptr ? "" : text_.dn()->value));
+        whole_ = false;
+    }
+    if (made != nullptr && faults.empty()) {
+        entries_.push_back(std::move(made));
+    }
+}
+
+// What the schema says about an attribute that matters here, looked up once.
+class attribute_rules {
+public:
+    struct rule {
+        bool modifiable = true;
+        bool single_value = false;
+        bool has_equality = true;
+    };
+
+    const rule& of(const asyntaxinfo* info)
+    {
+        const auto [place, added] = rules_.try_emplace(info);
+        if (added && info != nullptr) {
+            const auto& types = ldcf_schema_g->attribute_types;
+            if (const auto found = types.find(csgl_string(info->names[0])); found != types.end()) {
+                place->second = {found->second->user_modifiable(), found->second->single_value(),
+                                 found->second->equality().length() != 0};
+            }
+        }
+        return place->second;
+    }
+
+private:
+    std::unordered_map<const asyntaxinfo*, rule> rules_;
+};
+
+// The record of the same version of an attribute in another entry; null when there is none.
+const Attribute* counterpart(const Attribute& attribute, const Entry& other)
+{
+    if (attribute.a_info != nullptr) {
+        char tag[language_tag_buffer] = "";
+        parse_language_tags_with_buffer(attribute.a_type, nullptr, tag, nullptr, LANGUAGE_TAG);
+        return flatattr_find(&other, attribute.a_info, tag);
+    }
+    for (const Attribute* at = other.e_attrs; at != nullptr; at = at->a_next) {
+        if (at->a_info == nullptr && ::strcasecmp(at->a_type, attribute.a_type) == 0) {
+            return at;
+        }
+    }
+    return nullptr;
+}
+
+// Whether the values of an attribute are compared as bytes. They are found one by one nowhere: neither here in a value
+// tree nor by a server, unless the attribute has an equality rule.
+bool holds_bytes(const Attribute& attribute)
+{
+    return static_cast<unsigned>(attribute.a_syntax) == SC_BIN;
+}
+
+// The values of one attribute that another lacks.
+std::vector<const berval*> values_missing(const Attribute& from, const Attribute& in)
+{
+    std::vector<const berval*> missing;
+    std::unordered_set<std::string_view> bytes;
+    if (holds_bytes(in)) {
+        for (std::int64_t i = 0; i < in.a_numvals; ++i) {
+            bytes.insert(bytes_of(*in.a_vals[i]));
+        }
+    }
+    const auto syntax = static_cast<std::uint32_t>(in.a_syntax);
+    for (std::int64_t i = 0; i < from.a_numvals; ++i) {
+        const berval* const value = from.a_vals[i];
+        bool found = false;
+        if (holds_bytes(in)) {
+            found = bytes.contains(bytes_of(*value));
+        } else if (const int answer = value_find(&in, value, syntax, 1); answer >= 0) {
+            found = answer == 0;
+        } else {
+            found = std::any_of(in.a_vals, in.a_vals + in.a_numvals, [value, syntax](const berval* other) {
+                return bytes_of(*other) == bytes_of(*value) || value_cmp(other, value, syntax, 3) == 0;
+            });
+        }
+        if (!found) {
+            missing.push_back(value);
+        }
+    }
+    return missing;
+}
+
+std::vector<const berval*> all_values(const Attribute& attribute)
+{
+    return {attribute.a_vals, attribute.a_vals + attribute.a_numvals};
+}
+
+void append_modification(std::string& text, const char* operation, const Attribute& attribute,
+                         const std::vector<const berval*>& values)
+{
+    append_line(text, operation, attribute.a_type);
+    for (const berval* value : values) {
+        append_line(text, attribute.a_type, bytes_of(*value));
+    }
+    text += "-\n";
+}
+
+// The modifications that turn one entry into the other, which has the same DN; empty when they are equal.
+std::string modifications(const Entry& before, const Entry& after, attribute_rules& rules)
+{
+    std::string text;
+    for (const Attribute* old = before.e_attrs; old != nullptr; old = old->a_next) {
+        if (!rules.of(old->a_info).modifiable || old->a_numvals == 0) {
+            continue;
+        }
+        const Attribute* const now = counterpart(*old, after);
+        if (now == nullptr || now->a_numvals == 0) {
+            append_modification(text, "delete", *old, {});
+            continue;
+        }
+        const std::vector<const berval*> gone = values_missing(*old, *now);
+        const std::vector<const berval*> come = values_missing(*now, *old);
+        if (gone.empty() && come.empty()) {
+            continue;
+        }
+        // A server finds a value to delete by the equality rule. Without one, and where that is shorter, all values are
+        // replaced.
+        const attribute_rules::rule& rule = rules.of(old->a_info);
+        const bool replace = !gone.empty() && (!rule.has_equality || rule.single_value ||
+                                               gone.size() + come.size() >= static_cast<std::size_t>(now->a_numvals));
+        if (replace) {
+            append_modification(text, "replace", *now, all_values(*now));
+            continue;
+        }
+        if (!gone.empty()) {
+            append_modification(text, "delete", *old, gone);
+        }
+        if (!come.empty()) {
+            append_modification(text, "add", *now, come);
+        }
+    }
+    for (const Attribute* now = after.e_attrs; now != nullptr; now = now->a_next) {
+        const Attribute* const old = counterpart(*now, before);
+        if (rules.of(now->a_info).modifiable && now->a_numvals != 0 && (old == nullptr || old->a_numvals == 0)) {
+            append_modification(text, "add", *now, all_values(*now));
+        }
+    }
+    return text;
+}
+
+std::string all_lines(const Entry& entry, attribute_rules& rules)
+{
+    std::string text;
+    for (const Attribute* attribute = entry.e_attrs; attribute != nullptr; attribute = attribute->a_next) {
+        if (rules.of(attribute->a_info).modifiable) {
+            for (const berval* value : all_values(*attribute)) {
+                append_line(text, attribute->a_type, bytes_of(*value));
+            }
+        }
+    }
+    return text;
+}
+
+// The part of a normal DN behind its first RDN; empty for the last one.
+std::string_view parent_of(std::string_view dn)
+{
+    for (std::size_t at = 0; at < dn.size(); ++at) {
+        if (dn[at] == '\\') {
+            ++at;
+        } else if (dn[at] == ',') {
+            return dn.substr(at + 1);
+        }
+    }
+    return {};
+}
+
+std::size_t depth_of(const Entry* entry)
+{
+    std::size_t depth = 0;
+    for (std::string_view dn = entry->e_norm_dn; !dn.empty(); dn = parent_of(dn)) {
+        ++depth;
+    }
+    return depth;
+}
+
+// Writes change records.
+class change_writer {
+public:
+    explicit change_writer(bool as_json) : as_json_(as_json) {}
+
+    void write(const Entry& entry, const char* type, const std::string& body);
+    void finish(std::size_t deleted, std::size_t modified, std::size_t added);
+
+private:
+    bool as_json_;
+    bool begun_ = false;
+};
+
+void change_writer::write(const Entry& entry, const char* type, const std::string& body)
+{
+    std::string text;
+    append_line(text, "dn", entry.e_dn);
+    append_line(text, "changetype", type);
+    text += body;
+    if (as_json_) {
+        const json change = {{"dn", entry.e_dn}, {"changetype", type}, {"ldif", text}};
+        text = (begun_ ? ",\n    " : "{\n  \"changes\": [\n    ") +
+               change.dump(-1, ' ', false, json::error_handler_t::replace);
+    } else {
+        text.insert(0, begun_ ? "\n" : "version: 1\n\n");
+    }
+    begun_ = true;
+    write_result(text);
+}
+
+void change_writer::finish(std::size_t deleted, std::size_t modified, std::size_t added)
+{
+    if (as_json_) {
+        const json rest = {
+            {"deleted", deleted}, {"modified", modified}, {"added", added}, {"same", !begun_}, {"ok", true}};
+        write_result((begun_ ? "\n  ],\n" : "{\n  \"changes\": [],\n") + rest.dump(2).substr(2) + "\n");
+    }
+}
+
+// Tells of entries that go while others below them stay: no order makes a server take that.
+void tell_orphans(const ldif_side& before, const ldif_side& after)
+{
+    for (const entry_pointer& entry : after.entries()) {
+        const std::string_view parent = parent_of(entry->e_norm_dn);
+        if (before.find(parent) != nullptr && after.find(parent) == nullptr) {
+            tell("note: " + std::string(entry->e_dn) + " stays, and its parent goes; a server may refuse that");
+        }
+    }
+}
+
+}  // namespace
+
+int diff_ldif(const common_options& common, const std::string& before_file, const std::string& after_file)
+{
+    load_for_entries(common);
+    if (before_file == standard_input && after_file == standard_input) {
+        throw tool_failure(status_unusable, "", 0, "only one of the files can be standard input");
+    }
+    const ldif_side before(before_file);
+    const ldif_side after(after_file);
+    if (!before.is_whole() || !after.is_whole()) {
+        throw tool_failure(status_unusable, "", 0, "what isn't whole can't be compared");
+    }
+    const schema_reader guard;
+    attribute_rules rules;
+    change_writer out(common.as_json);
+    std::vector<const Entry*> going;
+    std::vector<const Entry*> coming;
+    std::size_t modified = 0;
+    for (const entry_pointer& entry : before.entries()) {
+        if (after.find(entry->e_norm_dn) == nullptr) {
+            going.push_back(entry.get());
+        }
+    }
+    for (const entry_pointer& entry : after.entries()) {
+        if (before.find(entry->e_norm_dn) == nullptr) {
+            coming.push_back(entry.get());
+        }
+    }
+    std::stable_sort(going.begin(), going.end(),
+                     [](const Entry* a, const Entry* b) { return depth_of(a) > depth_of(b); });
+    std::stable_sort(coming.begin(), coming.end(),
+                     [](const Entry* a, const Entry* b) { return depth_of(a) < depth_of(b); });
+    for (const Entry* entry : going) {
+        out.write(*entry, "delete", "");
+    }
+    for (const entry_pointer& entry : before.entries()) {
+        if (const Entry* const now = after.find(entry->e_norm_dn); now != nullptr) {
+            if (const std::string changes = modifications(*entry, *now, rules); !changes.empty()) {
+                out.write(*entry, "modify", changes);
+                ++modified;
+            }
+        }
+    }
+    for (const Entry* entry : coming) {
+        out.write(*entry, "add", all_lines(*entry, rules));
+    }
+    out.finish(going.size(), modified, coming.size());
+    tell_orphans(before, after);
+    return going.empty() && coming.empty() && modified == 0 ? status_yes : status_findings;
+}
+
+}  // namespace dirbase_tool
