@@ -16,6 +16,7 @@ if(TARGET dirbase_tool)
     install(FILES tools/dirbase/dirbase.1 DESTINATION ${CMAKE_INSTALL_MANDIR}/man1)
 endif()
 install(DIRECTORY share/schema/ DESTINATION ${CMAKE_INSTALL_DATADIR}/dirbase/schema)
+install(DIRECTORY share/sample/ DESTINATION ${CMAKE_INSTALL_DATADIR}/dirbase/sample FILES_MATCHING PATTERN "*.ldif")
 
 install(EXPORT dirbase NAMESPACE dirbase:: FILE dirbaseTargets.cmake DESTINATION ${package_dir})
 configure_package_config_file(cmake/dirbaseConfig.cmake.in ${PROJECT_BINARY_DIR}/dirbaseConfig.cmake

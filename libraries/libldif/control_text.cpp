@@ -282,8 +282,8 @@ std::int64_t localfromfile(const char* path, berval* target)
     }
     // The end of a directory is wherever its file system likes.
     struct stat status = {};
-    const bool has_end = fstat(fileno(file.get()), &status) == 0 && !S_ISDIR(status.st_mode) &&
-                         std::fseek(file.get(), 0, SEEK_END) == 0;
+    const bool has_end =
+        fstat(fileno(file.get()), &status) == 0 && !S_ISDIR(status.st_mode) && std::fseek(file.get(), 0, SEEK_END) == 0;
     const long size = has_end ? std::ftell(file.get()) : -1;
     if (size < 0 || std::fseek(file.get(), 0, SEEK_SET) != 0) {
         return refuse_file("fseek", path);

@@ -18,8 +18,8 @@ struct ldif_parts {
     bool is_base64;
 };
 
-// str_getline. False where that gives null.
-bool ldif_take_line(char** next, ldif_line& line);
+// str_getline of a text that ends at `end`. False where that gives null.
+bool ldif_take_line(char** next, char* end, ldif_line& line);
 
 // str_parse_line_v_or_bv of a line that ends at `end`.
 int ldif_split_line(char* line, char* end, int mode, ldif_parts& parts);

@@ -15,16 +15,16 @@ bool is_white_space(char c)
     return c == ' ' || (c >= '\t' && c <= '\r');
 }
 
-}  // namespace
-
-bool ldif_take_line(char** next, ldif_line& line)
+// Takes a line off a text in which a function finds the next line feed, or the zero byte at the end.
+template <typename Find>
+bool take_line(char** next, ldif_line& line, Find find_line_feed)
 {
     char* const begin = *next;
     if (begin == nullptr || *begin == '\0' || *begin == '\n') {
         return false;
     }
     line.begin = begin;
-    char* at = strchrnul(begin, '\n');
+    char* at = find_line_feed(begin);
     while (*at != '\0') {
         if (!is_white_space(at[1]) || at[1] == '\n') {
             *at = '\0';
@@ -34,11 +34,21 @@ bool ldif_take_line(char** next, ldif_line& line)
         }
         at[0] = ldif_fold_marker;
         at[1] = ldif_fold_marker;
-        at = strchrnul(at + 2, '\n');
+        at = find_line_feed(at + 2);
     }
     *next = nullptr;
     line.end = at;
     return true;
+}
+
+}  // namespace
+
+bool ldif_take_line(char** next, char* end, ldif_line& line)
+{
+    return take_line(next, line, [end](char* from) {
+        auto* const found = static_cast<char*>(std::memchr(from, '\n', static_cast<std::size_t>(end - from)));
+        return found == nullptr ? end : found;
+    });
 }
 
 bool ldif_has_marker(const char* text, const char* end)
@@ -121,7 +131,8 @@ extern "C" {
 char* str_getline(char** next)
 {
     ldif_line line;
-    return next != nullptr && ldif_take_line(next, line) ? line.begin : nullptr;
+    const auto find_line_feed = [](char* from) { return strchrnul(from, '\n'); };
+    return next != nullptr && take_line(next, line, find_line_feed) ? line.begin : nullptr;
 }
 
 char* str_remove_continued_line_marker(char* text, int* removed)

@@ -64,8 +64,9 @@ public:
             debug_error("str2entry_memberFix: returning NULL (missing newline after id)\n");
             return false;
         }
+        char* const end = text + std::strlen(text);
         ldif_line line;
-        while (ldif_take_line(&text, line)) {
+        while (ldif_take_line(&text, end, line)) {
             if (ldif_has_marker(line.begin, line.end)) {
                 line.end = ldif_remove_folds(line.begin, line.end);
             }
