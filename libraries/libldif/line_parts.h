@@ -6,7 +6,8 @@
 
 struct ldif_line {
     char* begin;
-    char* end;  // at the zero byte that ends it
+    char* end;    // at the zero byte that ends it
+    bool folded;  // holds markers of folds
 };
 
 struct ldif_parts {

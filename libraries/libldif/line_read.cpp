@@ -24,6 +24,7 @@ bool take_line(char** next, ldif_line& line, Find find_line_feed)
         return false;
     }
     line.begin = begin;
+    line.folded = false;
     char* at = find_line_feed(begin);
     while (*at != '\0') {
         if (!is_white_space(at[1]) || at[1] == '\n') {
@@ -34,6 +35,7 @@ bool take_line(char** next, ldif_line& line, Find find_line_feed)
         }
         at[0] = ldif_fold_marker;
         at[1] = ldif_fold_marker;
+        line.folded = true;
         at = find_line_feed(at + 2);
     }
     *next = nullptr;

@@ -65,9 +65,10 @@ public:
             return false;
         }
         char* const end = text + std::strlen(text);
+        const bool has_markers = ldif_has_marker(text, end);  // bytes that look like them, before any is made
         ldif_line line;
         while (ldif_take_line(&text, end, line)) {
-            if (ldif_has_marker(line.begin, line.end)) {
+            if (line.folded || has_markers) {
                 line.end = ldif_remove_folds(line.begin, line.end);
             }
             ldif_parts parts;

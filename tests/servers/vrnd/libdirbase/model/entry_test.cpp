@@ -70,8 +70,8 @@ TEST_F(Entries, ValuesAreDeletedOneByOneAndTheRestStays)
         int result;
         const char* left;
     } const table[] = {
-        {"cn", {"A", "x"}, 16, "b|c|B"}, {"cn", {"b", "b"}, 0, "a|c"},      {"cn", {"c", "b", "a", "B"}, 0, ""},
-        {"sn", {"a"}, 16, "a|b|c|B"},    {"unknown", {"a"}, 16, "a|b|c|B"},
+        {"cn", {"A", "x", "b"}, 16, "b|c|B"}, {"cn", {"b", "b"}, 0, "a|c"},      {"cn", {"c", "b", "a", "B"}, 0, ""},
+        {"sn", {"a"}, 16, "a|b|c|B"},         {"unknown", {"a"}, 16, "a|b|c|B"},
     };
     for (const auto& row : table) {
         test_entry entry;

@@ -79,6 +79,7 @@ TEST_F(EntryText, LinesBecomeAnEntry)
         {"dn: cn=a\ncert:< file:///etc/hostname\n", "0\ndn: cn=a\ncert: file:///etc/hostname\n"},
         {"dn:\n: x\n", "0\ndn: \n: x\n"},
         {"\n dn: cn=a\n", nullptr},  // a fold at the start is an empty line
+        {"dn: cn=a\x01\ncn: b\x01 c\n", "0\ndn: cn=a\ncn: b c\n"},
         {"5", nullptr},
         {"5\n", nullptr},
         {"cn: a\n", nullptr},
