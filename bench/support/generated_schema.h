@@ -46,8 +46,8 @@ std::string shipped_schema_text();
 // Puts a relational back end on the list of back ends, without which no attribute type gets a table.
 void provide_backend();
 
-// Makes the shipped schema the active one, with the name cache filled, unless an active schema is there. Benchmarks that
-// need another one empty it first, and leave it empty.
+// Makes the shipped schema the active one, with the name cache filled, unless an active schema is there. Benchmarks
+// that need another one empty it first, and leave it empty.
 void require_shipped_schema();
 
 // Reads all texts into an empty schema; nothing is linked.

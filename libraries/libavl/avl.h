@@ -82,8 +82,8 @@ DIRBASE_EXPORT int avl_apply(avl_node* root, avl_fn fn, void* arg, int stopflag,
 
 // Calls fmatch(stored, marg) for each object that matches a key, by descending only where such objects can be.
 //
-//   fcmp  compares as fcmp(data, stored, carg): 0 for a match; negative or positive when all matches are to the left, or
-//         to the right, of the stored object.
+//   fcmp  compares as fcmp(data, stored, carg): 0 for a match; negative or positive when all matches are to the left,
+//         or to the right, of the stored object.
 //
 // A match is visited before those in its left subtree, and these before those in its right one. Returns `stopflag` as
 // soon as fmatch gives it, else -6. A stopflag of -6 isn't to be used: the end of a left subtree stops the walk as

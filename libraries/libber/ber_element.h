@@ -146,7 +146,8 @@ DIRBASE_EXPORT int ber_flatten(const BerElement* ber, berval** value);
 //
 // Within a construction that this call entered nothing is read beyond its end. One left open stays entered, and its
 // closing in a later call moves nothing: it is for the caller to have read it all. Texts, numbers and so on are read
-// under any primitive tag that isn't universal; a universal one has to be theirs. Both brackets enter both SEQUENCE and SET.
+// under any primitive tag that isn't universal; a universal one has to be theirs. Both brackets enter both SEQUENCE and
+// SET.
 //
 // Returns the tag read last (0 for a format that reads none), or LBER_ERROR: what is there isn't what the letter asks,
 // no memory, more than LBER_MAX_OPEN open, a letter that isn't listed, an element that writes. After a failure the

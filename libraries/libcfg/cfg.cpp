@@ -81,8 +81,8 @@ bool is_empty(const char* text)
     return text == nullptr || *text == '\0';
 }
 
-// Flags are turned on once something has failed, of which they are to tell: what is kept with the handle stays. False for
-// another option.
+// Flags are turned on once something has failed, of which they are to tell: what is kept with the handle stays. False
+// for another option.
 bool set_flag(cfg_handle& cfg, int option, const void* value)
 {
     switch (option) {

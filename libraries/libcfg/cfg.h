@@ -13,9 +13,9 @@
 //     cfg_unbind(cfg);
 //
 // The file is read once, by cfg_bind_s; what becomes of it afterwards isn't seen. Every call with a handle, but for
-// setting a flag, sets the handle's result code, which cfg_get_errno gives; calls that return a code return the same one, and for the others a
-// null result comes with LDAP_SUCCESS where there simply is nothing more. LDAP_PARAM_ERROR stands for a missing handle
-// or argument, LDAP_NO_MEMORY for memory that ran out.
+// setting a flag, sets the handle's result code, which cfg_get_errno gives; calls that return a code return the same
+// one, and for the others a null result comes with LDAP_SUCCESS where there simply is nothing more. LDAP_PARAM_ERROR
+// stands for a missing handle or argument, LDAP_NO_MEMORY for memory that ran out.
 //
 // Threads: a handle and the messages of its searches belong to one thread at a time; different handles may be used at
 // once.

@@ -32,8 +32,8 @@ namespace test_support {
 // failing, until a run ends without having come to its failing allocation. Returns the number of allocations that
 // failed; none at all is a test failure, since then nothing was shown.
 //
-//   body  takes the point, checks for itself what it expects, and leaves nothing behind. Once an allocation has failed it
-//         may end by any exception; before that, an exception passes through to the caller.
+//   body  takes the point, checks for itself what it expects, and leaves nothing behind. Once an allocation has failed
+//         it may end by any exception; before that, an exception passes through to the caller.
 //
 // A run after the first that leaves more or fewer live blocks on this thread than it found is a test failure that names
 // the point. The first is let off because it fills what is filled once. Not to be nested.

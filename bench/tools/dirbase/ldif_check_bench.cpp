@@ -1,8 +1,8 @@
 // `dirbase ldif check` over a generated file, by one thread and by two.
 //
 // `entries` are checked in `seconds` of wall time, the schema's loading included; `us_an_entry` is the processor time
-// of all threads. `memory_mb` is the most that the program held. The run of two threads also tells how many times faster
-// it was than the run of one before it; the goal of that holds on a machine with two processors that are free.
+// of all threads. `memory_mb` is the most that the program held. The run of two threads also tells how many times
+// faster it was than the run of one before it; the goal of that holds on a machine with two processors that are free.
 //
 // The environment variable DIRBASE_BENCH_ENTRIES gives another number of entries than 100,000.
 #include <benchmark/benchmark.h>

@@ -212,7 +212,7 @@ TEST(AvlDamagedTree, AWayThatIsLongerThanABalancedTreeIsHighEndsThere)
 {
     std::vector<object> objects(400);
     avl_node* root = nullptr;
-    for (avl_node** link = &root; object& o : objects) {
+    for (avl_node** link = &root; object & o : objects) {
         o.key = static_cast<int>(&o - objects.data());
         *link = static_cast<avl_node*>(std::malloc(sizeof(avl_node)));
         **link = avl_node{&o, 0, nullptr, nullptr};

@@ -14,7 +14,8 @@ extern "C" {
 
 // Reads the character at the start of a zero-terminated text.
 //
-//   character  takes the character; may be null when only the length is wanted. Left alone when the result isn't positive.
+//   character  takes the character; may be null when only the length is wanted. Left alone when the result isn't
+//              positive.
 //   text       may be null. Nothing behind the first byte that doesn't belong to the character is read.
 //
 // Returns the number of bytes that make the character, 1 to 3, with 1 for the terminator as for any byte below 0x80; 0

@@ -42,7 +42,8 @@ DIRBASE_EXPORT bool is_string_alphanum(const char* text);
 DIRBASE_EXPORT bool attr_selected(const char* name, char** list);
 
 // Whether the first name is the attribute of the second, or a version of it: false when only the first has a ";",
-// and when both have one and the tags differ. Looks both up; two names that the schema doesn't know count as one attribute.
+// and when both have one and the tags differ. Looks both up; two names that the schema doesn't know count as one
+// attribute.
 DIRBASE_EXPORT bool is_subtype_attr(const char* a, const char* b);
 
 // Checks a mapping: two names joined by "$", the first of them in the schema, which is looked up, the second

@@ -3,10 +3,12 @@
 // The canonical text keeps the case of the values. In the upper text everything is in upper case that the schema
 // compares without regard to case; it is the key by which the whole server knows a DN. In both
 //
-//   - the pairs of an RDN are sorted by type, then by value, by vrn_strcasecmp; equal ones stay in the order of arrival;
+//   - the pairs of an RDN are sorted by type, then by value, by vrn_strcasecmp; equal ones stay in the order of
+//     arrival;
 //   - a type is the schema's first name of the attribute, whatever name or OID was written;
 //   - a value is escaped in one way only: a backslash in front of each of " + , ; < = > \, of a "#" or space at its
-//     beginning and of a space at its end; a line feed or tab at either end as a hexadecimal pair, since it would get lost;
+//     beginning and of a space at its end; a line feed or tab at either end as a hexadecimal pair, since it would get
+//     lost;
 //   - "+" joins pairs and "," RDNs, without blanks.
 //
 // So the canonical text normalises to itself, unless escapes have made it longer than dn_longest or a first name holds
@@ -200,9 +202,9 @@ DIRBASE_EXPORT int compare_ldapRDN33(const ldapRDN_struct33* a, const ldapRDN_st
 // free_ldap_escDN. Null for a null record or fewer than two RDNs, and without memory.
 DIRBASE_EXPORT ldap_escDN* ParentDN33(const ldap_escDN* dn);
 
-// A new text of all RDNs but the first with bare values, every RDN followed by ",", for the caller to free(): for people
-// to read, since values with separators can't be told apart in it. Null for a null record, one with an internal error or
-// fewer than two RDNs, and without memory.
+// A new text of all RDNs but the first with bare values, every RDN followed by ",", for the caller to free(): for
+// people to read, since values with separators can't be told apart in it. Null for a null record, one with an internal
+// error or fewer than two RDNs, and without memory.
 DIRBASE_EXPORT char* getParentDn(const ldap_escDN* dn);
 
 // A new upper text of all RDNs but the first, normalised by the active schema under the read side of the schema lock,

@@ -62,8 +62,8 @@ DIRBASE_EXPORT char* string_strip_trailing(char* text);
 // The shortest among the names and the OID of an attribute, the earliest of equally short ones; it belongs to the
 // schema. Null when the active schema doesn't know it.
 //
-//   temporary  set to 1 when the attribute's record has to be dropped after use (ldcf_api_attrtype_reset_info); records here
-//              live with their definitions, so it is always 0. May be null.
+//   temporary  set to 1 when the attribute's record has to be dropped after use (ldcf_api_attrtype_reset_info); records
+//              here live with their definitions, so it is always 0. May be null.
 DIRBASE_EXPORT const char* dn_attr_get_short_name(const char* name, int* temporary);
 
 // The same; an attribute that the schema doesn't know is told to the message log.

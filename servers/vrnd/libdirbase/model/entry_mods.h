@@ -34,7 +34,8 @@ DIRBASE_EXPORT int diffEntriesToMods(const Attribute* new_first, const Attribute
 //
 // Returns LDAP_SUCCESS; LDAP_PROTOCOL_ERROR, with message 92, for a modification without an array of values;
 // LDAP_NO_MEMORY, also for a DN that has no normal form because it is null or too long; LDAP_OTHER for a null `entry`.
-// The e_norm_dn of a refused DN is empty or a front of it: the result doesn't tell. The caller holds the read side of the schema lock.
+// The e_norm_dn of a refused DN is empty or a front of it: the result doesn't tell. The caller holds the read side of
+// the schema lock.
 DIRBASE_EXPORT int LDAPModToEntry(Entry** entry, char* dn, LDAPMod* const* mods);
 
 }  // extern "C"

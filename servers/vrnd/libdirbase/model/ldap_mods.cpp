@@ -102,8 +102,8 @@ void free_bv_chain(LDAPMod* first)
     free_ldmll(first);
 }
 
-// Copies a chain to *end, record by record; the end may be the chain's own, so its last record is found first. False when
-// memory ran out, with what was copied in place.
+// Copies a chain to *end, record by record; the end may be the chain's own, so its last record is found first. False
+// when memory ran out, with what was copied in place.
 bool append_copies(const LDAPMod* first, LDAPMod** end)
 {
     const LDAPMod* last = first;

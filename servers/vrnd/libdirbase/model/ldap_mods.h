@@ -27,8 +27,8 @@ DIRBASE_EXPORT void FreeMods(LDAPMod** array);
 // ---- copying --------------------------------------------------------------------------------------------------------
 
 // Copies one record whose values are bervals (whether mod_op says so isn't looked at; it is copied as it is, and has to
-// say so by the time free_ldapmod comes). The next record of the copy is null. Returns the copy for the caller to release with free_ldapmod; null for null, and when
-// memory ran out.
+// say so by the time free_ldapmod comes). The next record of the copy is null. Returns the copy for the caller to
+// release with free_ldapmod; null for null, and when memory ran out.
 DIRBASE_EXPORT LDAPMod* dup_mod(const LDAPMod* mod);
 
 // Copies a chain of such records. Null for null, and when memory ran out.

@@ -52,8 +52,8 @@ DIRBASE_EXPORT int adjust_to_UTC(tag_timestamp_struct* time, const char* zone);
 // Reads YYYYMMDDHHMMSS, then a point or comma and digits of a second if any, then a zone or none. The fraction is cut
 // after six digits.
 //
-//   time  receives the time; null to check the text only. When only the zone is bad it receives the time as written, and
-//         else nothing on failure.
+//   time  receives the time; null to check the text only. When only the zone is bad it receives the time as written,
+//         and else nothing on failure.
 //
 // Returns 0 or 21.
 DIRBASE_EXPORT int str2GeneralizedTime(const char* text, tag_timestamp_struct* time);
@@ -68,8 +68,8 @@ DIRBASE_EXPORT int str2UTCTime(const char* text, tag_timestamp_struct* time);
 
 // Reads a text of syntax SC_GT or SC_UTCT into a new record for the caller to free().
 //
-//   result  receives 0, a code of the two functions above, 90 when memory ran out, or 1 for another syntax code; the return
-//           is null then.
+//   result  receives 0, a code of the two functions above, 90 when memory ran out, or 1 for another syntax code; the
+//           return is null then.
 DIRBASE_EXPORT tag_timestamp_struct* str2timestamp(const char* text, std::uint32_t syntax, int* result);
 
 }  // extern "C"

@@ -1,7 +1,7 @@
 // Attributes of an entry by name: finding one, and adding a value to one, on entries of three sizes.
 //
-// A round takes each attribute of the entry once, in random order. The walks are over lists, until the entry is given an
-// index; `growth` is the cost over that in an entry of ten attributes, measured in the same run.
+// A round takes each attribute of the entry once, in random order. The walks are over lists, until the entry is given
+// an index; `growth` is the cost over that in an entry of ten attributes, measured in the same run.
 #include <benchmark/benchmark.h>
 
 #include <algorithm>

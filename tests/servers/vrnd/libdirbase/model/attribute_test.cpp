@@ -165,8 +165,8 @@ TEST_F(Attributes, ListsKeepBothOrdersWhateverIsAddedAndDeleted)
     }
 }
 
-// The lists of an entry with very many attributes, by whose index records are found, against those of one whose index is
-// taken away at every step.
+// The lists of an entry with very many attributes, by whose index records are found, against those of one whose index
+// is taken away at every step.
 TEST_F(Attributes, AnIndexChangesNothingButTheTime)
 {
     std::vector<std::string> names = {"cn", "sn", "member", "ref", "objectClass", "description", "2.5.4.3", "SN"};

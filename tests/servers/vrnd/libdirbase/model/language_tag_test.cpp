@@ -108,7 +108,7 @@ TEST_F(AttrNames, OrderVersionsAndSyntaxes)
     } const pairs[] = {
         {"cn", "commonName", true},         {"cn", "2.5.4.3;lang-en", true},     {"cn;lang-en", "cn", false},
         {"cn;lang-en", "CN;LANG-EN", true}, {"cn;lang-en", "cn;lang-de", false}, {"cn", "sn", false},
-        {"cert;binary", "cert", false},      {"none", "nothing", true},           {"cn;lang-en", "sn;lang-en", false},
+        {"cert;binary", "cert", false},     {"none", "nothing", true},           {"cn;lang-en", "sn;lang-en", false},
     };
     for (const auto& pair : pairs) {
         EXPECT_EQ(is_subtype_attr(pair.a, pair.b), pair.subtype) << pair.a << " " << pair.b;
