@@ -15,9 +15,25 @@ bool is_white_space(char c)
     return c == ' ' || (c >= '\t' && c <= '\r');
 }
 
+// The next line feed, or the zero byte at the end. Where that is isn't known, so the search goes on by a window at a time.
+char* find_line_feed(char* from)
+{
+    constexpr std::size_t window = 128;
+    for (;; from += window) {
+        const std::size_t length = strnlen(from, window);
+        auto* const found = static_cast<char*>(std::memchr(from, '\n', length));
+        if (found != nullptr) {
+            return found;
+        }
+        if (length < window) {
+            return from + length;
+        }
+    }
+}
+
 // Takes a line off a text in which a function finds the next line feed, or the zero byte at the end.
 template <typename Find>
-bool take_line(char** next, ldif_line& line, Find find_line_feed)
+bool take_line(char** next, ldif_line& line, Find find_end)
 {
     char* const begin = *next;
     if (begin == nullptr || *begin == '\0' || *begin == '\n') {
@@ -25,7 +41,7 @@ bool take_line(char** next, ldif_line& line, Find find_line_feed)
     }
     line.begin = begin;
     line.folded = false;
-    char* at = find_line_feed(begin);
+    char* at = find_end(begin);
     while (*at != '\0') {
         if (!is_white_space(at[1]) || at[1] == '\n') {
             *at = '\0';
@@ -36,7 +52,7 @@ bool take_line(char** next, ldif_line& line, Find find_line_feed)
         at[0] = ldif_fold_marker;
         at[1] = ldif_fold_marker;
         line.folded = true;
-        at = find_line_feed(at + 2);
+        at = find_end(at + 2);
     }
     *next = nullptr;
     line.end = at;
@@ -133,7 +149,6 @@ extern "C" {
 char* str_getline(char** next)
 {
     ldif_line line;
-    const auto find_line_feed = [](char* from) { return strchrnul(from, '\n'); };
     return next != nullptr && take_line(next, line, find_line_feed) ? line.begin : nullptr;
 }
 
