@@ -44,7 +44,8 @@ DIRBASE_EXPORT char* str_getline(char** next);
 // Removes the markers from a text in place and adds their number to *removed, unless that is null. Returns the text.
 DIRBASE_EXPORT char* str_remove_continued_line_marker(char* text, int* removed);
 
-// Splits a line into type and value, in place. A line with folds counts as the one that was folded.
+// Splits a line into type and value, in place. Marks and blanks are looked for where they stand, before folds are taken
+// out of type and value: a blank behind a fold belongs to the value.
 //
 //   type       takes the type, without white space in front of it and spaces behind it; null for a line without ":"
 //   value      takes the value, in the line and zero-terminated; a decoded one may hold zero bytes

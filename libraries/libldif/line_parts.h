@@ -22,8 +22,8 @@ struct ldif_parts {
 // str_getline of a text that ends at `end`. False where that gives null.
 bool ldif_take_line(char** next, char* end, ldif_line& line);
 
-// str_parse_line_v_or_bv of a line that ends at `end`.
-int ldif_split_line(char* line, char* end, int mode, ldif_parts& parts);
+// str_parse_line_v_or_bv of a line that ends at `end`. `marked` says whether it may hold markers.
+int ldif_split_line(char* line, char* end, int mode, bool marked, ldif_parts& parts);
 
 // Whether a text that ends at `end` holds markers: of folds, or bytes that came with it.
 bool ldif_has_marker(const char* text, const char* end);

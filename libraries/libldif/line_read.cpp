@@ -91,7 +91,7 @@ char* ldif_remove_folds(char* text, char* end)
     return to;
 }
 
-int ldif_split_line(char* line, char* end, int mode, ldif_parts& parts)
+int ldif_split_line(char* line, char* end, int mode, bool marked, ldif_parts& parts)
 {
     parts = {};
     while (is_white_space(*line)) {
@@ -107,6 +107,9 @@ int ldif_split_line(char* line, char* end, int mode, ldif_parts& parts)
         --type_end;
     }
     *type_end = '\0';
+    if (marked) {
+        type_end = ldif_remove_folds(line, type_end);
+    }
     parts.type = line;
     parts.type_length = static_cast<std::size_t>(type_end - line);
 
@@ -129,6 +132,9 @@ int ldif_split_line(char* line, char* end, int mode, ldif_parts& parts)
         debug_error("parse_line missing value- setting length=0\n");
         parts.value = end;
         return LDIF_LINE_EMPTY;
+    }
+    if (marked) {
+        end = ldif_remove_folds(value, end);
     }
     if (mode == LDIF_MODE_TRIMMED) {
         while (end > value && is_white_space(end[-1])) {
@@ -182,10 +188,7 @@ int str_parse_line_v_or_bv(char* line, char** type, char** value, std::size_t* l
             fold[0] = ldif_fold_marker;
             fold[1] = ldif_fold_marker;
         }
-        if (ldif_has_marker(line, end)) {
-            end = ldif_remove_folds(line, end);
-        }
-        result = ldif_split_line(line, end, mode, parts);
+        result = ldif_split_line(line, end, mode, ldif_has_marker(line, end), parts);
     }
     *type = parts.type;
     *value = parts.value;

@@ -68,11 +68,9 @@ public:
         const bool has_markers = ldif_has_marker(text, end);  // bytes that look like them, before any is made
         ldif_line line;
         while (ldif_take_line(&text, end, line)) {
-            if (line.folded || has_markers) {
-                line.end = ldif_remove_folds(line.begin, line.end);
-            }
             ldif_parts parts;
-            const int result = ldif_split_line(line.begin, line.end, LDIF_MODE_ENTRY, parts);
+            const int result =
+                ldif_split_line(line.begin, line.end, LDIF_MODE_ENTRY, line.folded || has_markers, parts);
             if (result == LDIF_LINE_BAD) {
                 debug_error("str2entry_memberFix: str_parse_line rc=%d\n", result);
             } else if (!take(parts)) {
