@@ -26,12 +26,19 @@ constexpr bool operator<(const catalogue_entry& a, const catalogue_entry& b)
 #define AT_PLACE "line %2$d of %1$s: "
 
 constexpr catalogue_entry catalogue[] = {
+    {MSG_COMPONENT_SERVER, 5, "Connection %1$d of client %2$s: request %3$d could not be decoded (%4$s)."},
     {MSG_COMPONENT_SERVER, 7, "The server is out of memory."},
     {MSG_COMPONENT_SERVER, 92, "The modification of attribute %1$s has no values."},
     {MSG_COMPONENT_SERVER, 106, "A tree of the server is damaged: %1$s."},
     {MSG_COMPONENT_SERVER, 168, "The attribute %1$s of an attribute mapping is not defined in the schema."},
     {MSG_COMPONENT_SERVER, 170, "The attribute name %1$s of an attribute mapping is not well-formed."},
     {MSG_COMPONENT_SERVER, 171, "The attribute mapping %1$s is not of the form name$name."},
+
+    {MSG_COMPONENT_OPERATION, 157,
+     "The attribute %1$s is encrypted and can be searched for only by equality and presence."},
+    {MSG_COMPONENT_OPERATION, 158, "The attribute %1$s is encrypted one way and can be searched for only by presence."},
+    {MSG_COMPONENT_OPERATION, 159, "The attribute %1$s can not be used in search filters."},
+    {MSG_COMPONENT_OPERATION, 160, "The attribute %1$s can be searched for only over a secure connection."},
 
     {MSG_COMPONENT_SCHEMA, 1, AT_PLACE "expected %3$s, but could not find it at or before %4$s"},
     {MSG_COMPONENT_SCHEMA, 2, AT_PLACE "expected one of the following: %3$s, but could not find it at or before %4$s"},
@@ -146,6 +153,7 @@ const char* catalogue_component(int component)
 {
     switch (component) {
     case MSG_COMPONENT_SERVER: return "SRV";
+    case MSG_COMPONENT_OPERATION: return "OPR";
     case MSG_COMPONENT_SCHEMA: return "SCH";
     case MSG_COMPONENT_RDBM: return "RDB";
     default: return nullptr;

@@ -25,6 +25,7 @@ enum message_severity : int {
 // Components, each with ids of its own.
 enum message_component : int {
     MSG_COMPONENT_SERVER = 0,
+    MSG_COMPONENT_OPERATION = 2,
     MSG_COMPONENT_SCHEMA = 4,
     MSG_COMPONENT_RDBM = 7,
 };

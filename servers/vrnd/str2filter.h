@@ -32,8 +32,8 @@ DIRBASE_EXPORT Filter* str2list(const char* text, std::uint64_t choice, int norm
 // Parses what stands between the parentheses of a filter without elements, such as "cn=a*".
 DIRBASE_EXPORT Filter* str2simple(const char* text, int normalize);
 
-// Puts the pieces of a text, which "*" parts, into a substring filter. What stands in front of the first "*" becomes the
-// initial piece even when it is empty, what stands behind the last one the final piece unless it is empty.
+// Puts the pieces of a text, which "*" parts, into a substring filter. What stands in front of the first "*" becomes
+// the initial piece even when it is empty, what stands behind the last one the final piece unless it is empty.
 //
 //   filter  its pieces are null
 //   syntax  syntax code of the attribute; with `normalize` the pieces are normalised by it as far as that can be done

@@ -29,7 +29,8 @@ extern "C" {
 //   filter      takes a new filter for filter_free; null when it is undefined and on failure
 //   text        takes its canonical text for logs, with "(", ")", "*" and backslash of values written as a backslash
 //               and two hexadecimal digits; null when there is no filter
-//   error_text  may be null. Takes words for the client where a failure has them, and is left alone else.
+//   error_text  may be null. Where a failure has words for the client takes a new text, without a look at what was
+//               there, and is left alone else.
 //
 // Returns LDAP_SUCCESS;
 //   LDAP_PROTOCOL_ERROR             no filter is there
@@ -55,9 +56,9 @@ DIRBASE_EXPORT int get_filter_list(const Connection* conn, BerElement* ber, Filt
 //
 //   text  takes the text; null on failure
 //
-// Returns what get_filter does, and where that is silent LDAP_NO_SUCH_ATTRIBUTE for an attribute that the schema doesn't
-// know, behind which the position is then, and LDAP_CONSTRAINT_VIOLATION for a piece longer than the attribute's column.
-// What was read before a failure is in the filter, for filter_free.
+// Returns what get_filter does, and where that is silent LDAP_NO_SUCH_ATTRIBUTE for an attribute that the schema
+// doesn't know, behind which the position is then, and LDAP_CONSTRAINT_VIOLATION for a piece longer than the
+// attribute's column. What was read before a failure is in the filter, for filter_free.
 DIRBASE_EXPORT int get_substring_filter(const Connection* conn, BerElement* ber, Filter* filter, char** text,
                                         char** error_text);
 
