@@ -24,9 +24,10 @@ bool is_plain(std::string_view value)
     return value.find_first_of(std::string_view("()*\\\0", 5)) == std::string_view::npos;
 }
 
-bool is_plain_type(const char* type)
+bool is_plain_type(std::string_view type)
 {
-    return is_plain(type) && std::strchr("&|!", *type) == nullptr;
+    return is_plain(type) &&
+           (type.empty() || (type.find_first_of("&|!") != 0 && type.find_last_of("<>~") != type.size() - 1));
 }
 
 bool is_plain(const Filter& filter)
