@@ -43,7 +43,9 @@ constexpr unsigned LBER_MAX_OPEN = 100;
 //   an element that writes   once every sequence is closed, the encoding is the ber_ptr - ber_buf bytes from ber_buf,
 //                            the start of a block of malloc; both are null before the first write. ber_end is the
 //                            block's end. The caller may take the block, and then says ber_free(ber, 0).
-//   an element that reads    ber_ptr is the next byte to be read of those from ber_buf to ber_end.
+//   an element that reads    ber_ptr is the next byte to be read of those from ber_buf to ber_end. A caller that reads
+//                            the members of a construction may draw ber_end in to the construction's end, and put it
+//                            back afterwards: nothing is read beyond it.
 struct BerElement {
     std::uint8_t ber_options;  // for the caller to set; the encoding is the same whatever it says
     char* ber_buf;

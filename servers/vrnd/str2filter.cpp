@@ -8,12 +8,12 @@
 
 #include "libraries/libber/ldap_result.h"
 #include "libraries/libmsg/debug_log.h"
-#include "servers/vrnd/libdirbase/base/charray.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
 #include "servers/vrnd/libdirbase/base/utf8_text.h"
 #include "servers/vrnd/libdirbase/model/attr_names.h"
 #include "servers/vrnd/libdirbase/model/filter_guards.h"
+#include "servers/vrnd/libdirbase/model/substring_pieces.h"
 #include "servers/vrnd/libdirbase/model/value_normalize.h"
 
 namespace {
@@ -119,11 +119,12 @@ void normalize_piece(heap_text& piece, std::uint32_t syntax)
 
 bool add_pieces(std::string_view text, filter_substrings& pieces, std::uint32_t syntax, bool normalize)
 {
+    substring_pieces inner;
     for (bool first = true, last = false; !last; first = false) {
         const std::size_t end = text.find('*');
         last = end == std::string_view::npos;
         if (last && text.empty() && !first) {
-            return true;
+            break;
         }
         heap_text piece = copy_of(text.substr(0, end));
         if (piece == nullptr) {
@@ -137,13 +138,13 @@ bool add_pieces(std::string_view text, filter_substrings& pieces, std::uint32_t 
             pieces.f_sub_initial = piece.release();
         } else if (last) {
             pieces.f_sub_final = piece.release();
-        } else if (charray_add(&pieces.f_sub_any, piece.get()) == LDAP_SUCCESS) {
-            (void)piece.release();  // the array has it
-        } else {
+        } else if (!inner.add(std::move(piece))) {
+            tell_no_memory("str2subvals");
             return false;
         }
         text.remove_prefix(last ? text.size() : end + 1);
     }
+    pieces.f_sub_any = inner.release();
     return true;
 }
 
@@ -231,24 +232,13 @@ filter_guard parse_simple(std::string_view text, bool normalize)
 
 filter_guard parse_list(std::string_view text, std::uint64_t choice, bool normalize, unsigned depth);
 
-// Parses a filter `depth` levels down.
-filter_guard parse_filter(std::string_view text, bool normalize, unsigned depth)
+// Parses what stands between the parentheses of a filter `depth` levels down.
+filter_guard parse_inside(std::string_view text, bool normalize, unsigned depth)
 {
-    if (text.empty()) {
-        return nullptr;
-    }
     if (depth > FILTER_MAX_DEPTH) {
         debug_error("Error - str2filter: more than %u levels of nesting\n", FILTER_MAX_DEPTH);
         return nullptr;
     }
-    if (text.front() != '(') {
-        return parse_simple(text, normalize);
-    }
-    const std::size_t end = matching_parenthesis(text);
-    if (end == std::string_view::npos) {
-        return nullptr;
-    }
-    text = text.substr(1, end - 1);
     switch (text.empty() ? '\0' : text.front()) {
     case '&': return parse_list(text.substr(1), LDAP_FILTER_AND, normalize, depth);
     case '|': return parse_list(text.substr(1), LDAP_FILTER_OR, normalize, depth);
@@ -257,30 +247,46 @@ filter_guard parse_filter(std::string_view text, bool normalize, unsigned depth)
     }
 }
 
+// Parses the filter that a text begins with, and takes it off the text. A text that doesn't begin with a parenthesis
+// is no member of a list.
+filter_guard take_member(std::string_view& text, bool normalize, unsigned depth)
+{
+    const std::size_t end = matching_parenthesis(text);
+    if (end == std::string_view::npos || end == 0) {
+        return nullptr;
+    }
+    filter_guard member = parse_inside(text.substr(1, end - 1), normalize, depth);
+    text.remove_prefix(end + 1);
+    return member;
+}
+
 filter_guard parse_list(std::string_view text, std::uint64_t choice, bool normalize, unsigned depth)
 {
     filter_guard parent = new_filter(choice);
-    filter_list children;
+    filter_list members;
     while (parent != nullptr) {
         while (!text.empty() && is_space(text.front())) {
             text.remove_prefix(1);
         }
         if (text.empty()) {
+            parent->f_list = members.release();
             break;
         }
-        const std::size_t end = matching_parenthesis(text);
-        filter_guard child =
-            end == std::string_view::npos ? nullptr : parse_filter(text.substr(0, end + 1), normalize, depth + 1);
-        if (child == nullptr) {
+        filter_guard member = take_member(text, normalize, depth + 1);
+        if (member == nullptr) {
             return nullptr;
         }
-        children.append(std::move(child));
-        text.remove_prefix(end + 1);
-    }
-    if (parent != nullptr) {
-        parent->f_list = children.release();
+        members.append(std::move(member));
     }
     return parent;
+}
+
+filter_guard parse_filter(std::string_view text, bool normalize)
+{
+    if (text.empty()) {
+        return nullptr;
+    }
+    return text.front() == '(' ? take_member(text, normalize, 1) : parse_simple(text, normalize);
 }
 
 }  // namespace
@@ -289,7 +295,7 @@ extern "C" {
 
 Filter* str2filter(const char* text, int normalize)
 {
-    return text == nullptr ? nullptr : parse_filter(text, normalize != 0, 1).release();
+    return text == nullptr ? nullptr : parse_filter(text, normalize != 0).release();
 }
 
 Filter* str2list(const char* text, std::uint64_t choice, int normalize)

@@ -1,14 +1,16 @@
 // Filters from text (RFC 4515), for configuration, replication filters, referral rules and plug-ins.
 //
-// Of that grammar extensible match is not offered. Elsewhere this reader asks for less than the grammar does: a filter
-// needs no parentheses around it, text behind its closing parenthesis is passed over, a list may be empty and a NOT may
-// have several elements (the first of which counts), white space may stand in front of the elements of a list. There
-// are no blanks around "=". The backslash with two hexadecimal digits stands for a byte in values that are compared
-// whole; in the pieces of a substring filter it stands for itself.
+// Of that grammar extensible match is not offered: "cn:=a" is equality on a type "cn:". Elsewhere this reader asks for
+// less than the grammar does: a filter needs no parentheses around it, text behind its closing parenthesis is passed
+// over, a list may be empty and a NOT may have several elements (the first of which counts), white space may stand in
+// front of the elements of a list. There are no blanks around "=". The backslash with two hexadecimal digits stands for
+// a byte in values that are compared whole; in the pieces of a substring filter it stands for itself.
 //
 //   normalize  not 0: types and values are normalised by the schema, and there is no filter for an attribute that it
-//              doesn't know, but for presence and substrings. The caller holds the read side of the schema lock then.
-//              0: values stay as they are written.
+//              doesn't know, but for presence and substrings. A value that its syntax refuses, or that there was no
+//              memory for, stays as it is written. The caller holds the read side of the schema lock then.
+//              0: types and values stay as they are written, but for the types of presence filters, which
+//              attr_normalize puts in their plain form.
 //
 // Filters are nested FILTER_MAX_DEPTH levels deep at most; a deeper one gives null. Results are new, for filter_free;
 // null means that the text isn't a filter, or that memory ran out. Texts are read only. Every function may be called
@@ -35,7 +37,8 @@ DIRBASE_EXPORT Filter* str2simple(const char* text, int normalize);
 // Puts the pieces of a text, which "*" parts, into a substring filter. What stands in front of the first "*" becomes
 // the initial piece even when it is empty, what stands behind the last one the final piece unless it is empty.
 //
-//   filter  its pieces are null
+//   text    not null
+//   filter  not null, and its pieces are null
 //   syntax  syntax code of the attribute; with `normalize` the pieces are normalised by it as far as that can be done
 //
 // Returns LDAP_SUCCESS, or LDAP_NO_MEMORY with what was made before in the filter.

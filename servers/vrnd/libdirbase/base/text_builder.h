@@ -26,18 +26,23 @@ public:
     }
     bool append(char character) { return append(std::string_view(&character, 1)); }
 
+    bool failed() const { return failed_; }
     std::size_t length() const { return length_; }
 
     // The text so far, without a terminator.
     std::string_view view() const { return {text_.get(), length_}; }
 
-    // The text, which is the caller's from then on; null when memory ran out.
+    // Takes back what was added behind the first `length` bytes.
+    void cut(std::size_t length) { length_ = std::min(length, length_); }
+
+    // The text, which is the caller's from then on; null when memory ran out. The builder starts anew.
     heap_text release()
     {
         if (!reserve(0)) {
             return nullptr;
         }
         text_.get()[length_] = '\0';
+        length_ = 0;
         return std::move(text_);
     }
 

@@ -1,8 +1,8 @@
 // Filters from BER: see filter_ber.h.
 //
 // A member of a construction can't be read beyond that construction: while it is read, the element ends there
-// (ber_scope). The canonical text of a filter grows in one block from the inside out: a list begins with its own
-// operator, and its members' texts are put behind it.
+// (ber_scope). The canonical text is written while the filter is read, into one builder; what a filter wrote before it
+// turned out to be undefined is cut off again.
 #include "servers/vrnd/libdirbase/connection/filter_ber.h"
 
 #include <algorithm>
@@ -15,7 +15,6 @@
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libmsg/message_log.h"
 #include "libraries/libvrnutil/vrn_text.h"
-#include "servers/vrnd/libdirbase/base/charray.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/password_values.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
@@ -23,11 +22,14 @@
 #include "servers/vrnd/libdirbase/base/utf8_text.h"
 #include "servers/vrnd/libdirbase/model/attr_names.h"
 #include "servers/vrnd/libdirbase/model/filter_guards.h"
+#include "servers/vrnd/libdirbase/model/substring_pieces.h"
 #include "servers/vrnd/libdirbase/model/value_normalize.h"
 
 namespace {
 
 constexpr int encryption_two_way = 0x80;
+constexpr ber_tag_t constructed = 0x20;
+constexpr std::size_t first_room = 128;      // of a text
 constexpr std::size_t longest_shown = 8100;  // of a value in the debug log
 
 // Enters the construction at the position of an element: reads end with it, and behind it goes on what comes next.
@@ -36,8 +38,10 @@ public:
     explicit ber_scope(BerElement* ber) : ber_(ber), outer_end_(ber == nullptr ? nullptr : ber->ber_end)
     {
         ber_len_t length = 0;
-        entered_ = ber_skip_tag(ber, &length) != LBER_ERROR;
+        const ber_tag_t tag = ber_peek_tag(ber, &length);
+        entered_ = tag != LBER_ERROR && (tag & constructed) != 0;
         if (entered_) {
+            ber_skip_tag(ber, &length);
             ber_->ber_end = ber_->ber_ptr + length;
         }
     }
@@ -65,12 +69,7 @@ struct filter_source {
     const Connection* conn;
     BerElement* ber;
     char** error_text;
-};
-
-// What was read: no filter and no text when it is undefined.
-struct filter_read {
-    filter_guard filter;
-    heap_text text;
+    text_builder& text;
 };
 
 int malformed(const char* function)
@@ -139,42 +138,22 @@ bool append_expanded(text_builder& text, std::string_view value)
     return added;
 }
 
-// The text of a value as far as other texts hold it, which is up to its first zero byte.
-std::string_view text_of(const berval& value)
-{
-    return value.bv_val == nullptr ? std::string_view() : std::string_view(value.bv_val);
-}
-
-// Releases the text into the result, or tells that memory ran out.
-int finish_text(text_builder& text, heap_text& result, const char* function)
-{
-    result = text.release();
-    return result == nullptr ? tell_no_memory(function) : LDAP_SUCCESS;
-}
-
-int make_assertion_text(const Filter& filter, heap_text& result)
-{
-    const char* const between = filter.f_choice == LDAP_FILTER_GE       ? ">="
-                                : filter.f_choice == LDAP_FILTER_LE     ? "<="
-                                : filter.f_choice == LDAP_FILTER_APPROX ? "~="
-                                                                        : "=";
-    const std::string_view type = filter.f_ava.ava_type;
-    const std::string_view value = text_of(filter.f_ava.ava_value);
-    text_builder text(type.size() + value.size() + sizeof "(~=)");
-    text.append('(') && text.append(type) && text.append(between) && append_expanded(text, value) && text.append(')');
-    return finish_text(text, result, "get_filter");
-}
-
 // ---- assertions -----------------------------------------------------------------------------------------------------
 
-int read_assertion(const filter_source& from, ava& assertion, std::uint64_t choice)
+// A text would end there.
+bool has_zero(const berval& value)
+{
+    return std::memchr(value.bv_val, '\0', value.bv_len) != nullptr;
+}
+
+int read_assertion(const Connection* conn, BerElement* ber, ava& assertion, std::uint64_t choice, char** error_text)
 {
     {
-        const ber_scope inside(from.ber);
-        heap_text type = inside ? read_type(from.ber) : nullptr;
+        const ber_scope inside(ber);
+        heap_text type = inside ? read_type(ber) : nullptr;
         berval& value = assertion.ava_value;
-        if (type == nullptr || fber_get_string_len(from.ber, &value.bv_val, &value.bv_len) == LBER_ERROR) {
-            return malformed_assertion(from.conn);
+        if (type == nullptr || fber_get_string_len(ber, &value.bv_val, &value.bv_len) == LBER_ERROR) {
+            return malformed_assertion(conn);
         }
         assertion.ava_type = type.release();
     }
@@ -187,7 +166,11 @@ int read_assertion(const filter_source& from, ava& assertion, std::uint64_t choi
         debug_error("get_ava_for_filter: Unknown attribute in filter.\n");
         return LDAP_NO_SUCH_ATTRIBUTE;
     }
-    int result = filter_check_attr_constraints(from.conn, choice, info, from.error_text);
+    int result = filter_check_attr_constraints(conn, choice, info, error_text);
+    if (result == LDAP_SUCCESS && (syntax & SC_CIS) != 0 && has_zero(assertion.ava_value)) {
+        debug_error("get_ava_for_filter: a byte 0 in a text\n");
+        result = LDAP_INVALID_SYNTAX;
+    }
     if (result == LDAP_SUCCESS) {
         result = value_normalize_berval(&assertion.ava_value, syntax, 0);
     }
@@ -237,33 +220,39 @@ int read_piece(BerElement* ber, heap_text& piece, ber_len_t* length)
 }
 
 // Puts a piece where its tag says.
-int keep_piece(ber_tag_t tag, heap_text piece, filter_substrings& pieces)
+int keep_piece(ber_tag_t tag, heap_text piece, filter_substrings& pieces, substring_pieces& inner)
 {
-    if (tag == LDAP_SUBSTRING_ANY) {
-        if (charray_add(&pieces.f_sub_any, piece.get()) != LDAP_SUCCESS) {
-            return LDAP_NO_MEMORY;
+    switch (tag) {
+    case LDAP_SUBSTRING_ANY: return inner.add(std::move(piece)) ? LDAP_SUCCESS : tell_no_memory("get_substring_filter");
+    case LDAP_SUBSTRING_INITIAL:
+    case LDAP_SUBSTRING_FINAL: {
+        char*& place = tag == LDAP_SUBSTRING_INITIAL ? pieces.f_sub_initial : pieces.f_sub_final;
+        if (place != nullptr) {
+            debug_error("get_substring_filter: two pieces at one end\n");
+            return LDAP_PROTOCOL_ERROR;
         }
-        (void)piece.release();  // the array has it
+        place = piece.release();
         return LDAP_SUCCESS;
     }
-    char*& place = tag == LDAP_SUBSTRING_INITIAL ? pieces.f_sub_initial : pieces.f_sub_final;
-    if (place != nullptr) {
-        debug_error("get_substring_filter: two pieces at one end\n");
-        return LDAP_PROTOCOL_ERROR;
+    default: debug_error("get_substring_filter: unknown type\n"); return LDAP_PROTOCOL_ERROR;
     }
-    place = piece.release();
-    return LDAP_SUCCESS;
 }
 
-bool is_substring_tag(ber_tag_t tag)
+// Makes a piece ready to be compared with values of an attribute.
+int prepare_piece(heap_text& piece, std::size_t length, const asyntaxinfo& info)
 {
-    return tag == LDAP_SUBSTRING_INITIAL || tag == LDAP_SUBSTRING_ANY || tag == LDAP_SUBSTRING_FINAL;
+    const std::size_t limit = info.attr == nullptr ? 0 : info.attr->length;
+    if (limit != 0 && length > limit) {
+        debug_error("get_substring_filter: value longer than schema allows.\n");
+        return LDAP_CONSTRAINT_VIOLATION;
+    }
+    return normalize_piece(piece, info.syntax);
 }
 
 // Reads the pieces of an attribute, which `info` is null for when the schema doesn't know it.
-int read_pieces(const filter_source& from, const asyntaxinfo* info, filter_substrings& pieces, text_builder& text)
+int read_pieces(const filter_source& from, const asyntaxinfo* info, filter_substrings& pieces)
 {
-    const std::size_t limit = info == nullptr || info->attr == nullptr ? 0 : info->attr->length;
+    substring_pieces inner;
     char* last = nullptr;
     ber_len_t length = 0;
     ber_tag_t tag = ber_first_element(from.ber, &length, &last);
@@ -273,35 +262,24 @@ int read_pieces(const filter_source& from, const asyntaxinfo* info, filter_subst
     for (; tag != LBER_DEFAULT; tag = ber_next_element(from.ber, &length, last)) {
         heap_text piece;
         int result = tag == LBER_ERROR ? malformed("get_substring_filter") : read_piece(from.ber, piece, &length);
-        if (result == LDAP_SUCCESS && !is_substring_tag(tag)) {
-            debug_error("get_substring_filter: unknown type\n");
-            result = LDAP_PROTOCOL_ERROR;
-        }
-        if (result == LDAP_SUCCESS && limit != 0 && length > limit) {
-            debug_error("get_substring_filter: value longer than schema allows.\n");
-            result = LDAP_CONSTRAINT_VIOLATION;
-        }
         if (result == LDAP_SUCCESS && info != nullptr) {
-            result = normalize_piece(piece, info->syntax);
+            result = prepare_piece(piece, length, *info);
         }
         if (result == LDAP_SUCCESS) {
-            if (tag != LDAP_SUBSTRING_INITIAL) {
-                text.append('*');
-            }
-            append_expanded(text, piece.get());
-            result = keep_piece(tag, std::move(piece), pieces);
+            from.text.append(tag == LDAP_SUBSTRING_INITIAL ? "" : "*");
+            append_expanded(from.text, piece.get());
+            result = keep_piece(tag, std::move(piece), pieces, inner);
         }
         if (result != LDAP_SUCCESS) {
             return result;
         }
     }
-    if (pieces.f_sub_final == nullptr) {
-        text.append('*');
-    }
+    from.text.append(pieces.f_sub_final == nullptr ? "*)" : ")");
+    pieces.f_sub_any = inner.release();
     return LDAP_SUCCESS;
 }
 
-int read_substrings(const filter_source& from, filter_substrings& pieces, heap_text& result)
+int read_substrings(const filter_source& from, filter_substrings& pieces)
 {
     const ber_scope inside(from.ber);
     heap_text type = inside ? read_type(from.ber) : nullptr;
@@ -310,33 +288,27 @@ int read_substrings(const filter_source& from, filter_substrings& pieces, heap_t
     }
     pieces.f_sub_type = type.release();
     asyntaxinfo* info = nullptr;
-    const bool known = attr_syntax_for_filter_return_asi(pieces.f_sub_type, &info) != 0;
-    int failed =
-        filter_check_attr_constraints(from.conn, LDAP_FILTER_SUBSTRINGS, known ? info : nullptr, from.error_text);
-    if (failed != LDAP_SUCCESS) {
-        return failed;
+    if (attr_syntax_for_filter_return_asi(pieces.f_sub_type, &info) == 0) {
+        info = nullptr;
     }
-    text_builder text(2 * static_cast<std::size_t>(from.ber->ber_end - from.ber->ber_ptr) + sizeof "(=*)");
-    text.append('(') && text.append(pieces.f_sub_type) && text.append('=');
-    failed = read_pieces(from, known ? info : nullptr, pieces, text);
-    if (failed != LDAP_SUCCESS) {
-        return failed;
+    int result = filter_check_attr_constraints(from.conn, LDAP_FILTER_SUBSTRINGS, info, from.error_text);
+    if (result == LDAP_SUCCESS) {
+        from.text.append('(') && from.text.append(pieces.f_sub_type) && from.text.append('=');
+        result = read_pieces(from, info, pieces);
     }
-    if (!known) {
+    if (result == LDAP_SUCCESS && info == nullptr) {
         debug_error("get_substring_filter: Unknown attribute in filter.\n");
-        return LDAP_NO_SUCH_ATTRIBUTE;
+        result = LDAP_NO_SUCH_ATTRIBUTE;
     }
-    text.append(')');
-    return finish_text(text, result, "get_substring_filter");
+    return result;
 }
 
 // ---- filters --------------------------------------------------------------------------------------------------------
 
-int read_filter(const filter_source& from, unsigned depth, filter_read& read);
+int read_filter(const filter_source& from, unsigned depth, filter_guard& filter);
 
-// Reads the members of the set at the position, `depth` levels down. There is no list when one of them makes it
-// undefined. Their texts are put behind what `text` holds.
-int read_list(const filter_source& from, std::uint64_t choice, unsigned depth, filter_list& list, text_builder& text)
+// Reads the members of the set at the position, `depth` levels down. There are none when one of them makes it undefined.
+int read_list(const filter_source& from, std::uint64_t choice, unsigned depth, filter_list& members)
 {
     const ber_scope inside(from.ber);
     if (!inside) {
@@ -344,101 +316,81 @@ int read_list(const filter_source& from, std::uint64_t choice, unsigned depth, f
     }
     bool undefined = false;
     while (!inside.at_end()) {
-        filter_read member;
+        filter_guard member;
         const int result = read_filter(from, depth, member);
         if (result != LDAP_SUCCESS) {
             return result;
         }
-        if (member.filter != nullptr) {
-            if (!undefined && !text.append(member.text.get())) {
-                return tell_no_memory("get_filter_list");
-            }
-            list.append(std::move(member.filter));
-        } else if (choice == LDAP_FILTER_AND) {
-            undefined = true;
-        } else if (choice != LDAP_FILTER_OR) {
+        if (member == nullptr && choice != LDAP_FILTER_AND && choice != LDAP_FILTER_OR) {
             return LDAP_OPERATIONS_ERROR;
         }
-    }
-    if (undefined) {
-        list.clear();
+        undefined = undefined || (member == nullptr && choice == LDAP_FILTER_AND);
+        if (undefined) {
+            members.clear();
+        } else if (member != nullptr) {
+            members.append(std::move(member));
+        }
     }
     return LDAP_SUCCESS;
 }
 
-int read_presence(const filter_source& from, filter_read& read)
+int read_presence(const filter_source& from, filter_guard& filter)
 {
-    if (ber_scanf_w(from.ber, "a", &read.filter->f_type) == LBER_ERROR) {
+    if (ber_scanf_w(from.ber, "a", &filter->f_type) == LBER_ERROR) {
         return malformed("get_filter");
     }
-    if (attr_syntax_for_filter(read.filter->f_type) == 0) {
-        read.filter.reset();
-        return LDAP_SUCCESS;
+    if (attr_syntax_for_filter(filter->f_type) == 0) {
+        return LDAP_NO_SUCH_ATTRIBUTE;
     }
-    const std::string_view type = attr_normalize(read.filter->f_type);
-    text_builder text(type.size() + sizeof "(=*)");
-    text.append('(') && text.append(type) && text.append("=*)");
-    return finish_text(text, read.text, "get_filter");
+    from.text.append('(') && from.text.append(attr_normalize(filter->f_type)) && from.text.append("=*)");
+    return LDAP_SUCCESS;
 }
 
-int read_and_or(const filter_source& from, unsigned depth, filter_read& read)
+int read_and_or(const filter_source& from, unsigned depth, filter_guard& filter)
 {
-    text_builder text(64);
-    text.append(read.filter->f_choice == LDAP_FILTER_AND ? "(&" : "(|");
-    filter_list list;
-    const int result = read_list(from, read.filter->f_choice, depth + 1, list, text);
-    if (result != LDAP_SUCCESS) {
-        return result;
-    }
-    read.filter->f_list = list.release();
-    if (read.filter->f_list == nullptr) {
-        read.filter.reset();
-        return LDAP_SUCCESS;
-    }
-    text.append(')');
-    return finish_text(text, read.text, "get_filter");
-}
-
-int read_not(const filter_source& from, unsigned depth, filter_read& read)
-{
-    filter_read child;
-    {
-        const ber_scope inside(from.ber);
-        const int result = inside ? read_filter(from, depth + 1, child) : LDAP_PROTOCOL_ERROR;
-        if (result != LDAP_SUCCESS) {
-            return result;
-        }
-        if (!inside.at_end()) {
-            return malformed("get_filter");  // a NOT has one child
-        }
-    }
-    if (child.filter == nullptr) {
-        read.filter.reset();
-        return LDAP_SUCCESS;
-    }
-    read.filter->f_list = child.filter.release();
-    text_builder text(std::strlen(child.text.get()) + sizeof "(!)");
-    text.append("(!") && text.append(child.text.get()) && text.append(')');
-    return finish_text(text, read.text, "get_filter");
-}
-
-// What makes an assertion undefined isn't a failure.
-int undefined_or_failed(int result, filter_read& read)
-{
-    if (result == LDAP_NO_SUCH_ATTRIBUTE || result == LDAP_CONSTRAINT_VIOLATION) {
-        read.filter.reset();
-        return LDAP_SUCCESS;
+    from.text.append(filter->f_choice == LDAP_FILTER_AND ? "(&" : "(|");
+    filter_list members;
+    const int result = read_list(from, filter->f_choice, depth + 1, members);
+    if (result == LDAP_SUCCESS && members.empty()) {
+        filter.reset();
+    } else if (result == LDAP_SUCCESS) {
+        filter->f_list = members.release();
+        from.text.append(')');
     }
     return result;
 }
 
-int read_ava(const filter_source& from, filter_read& read)
+int read_not(const filter_source& from, unsigned depth, filter_guard& filter)
 {
-    const int result = read_assertion(from, read.filter->f_ava, read.filter->f_choice);
+    const ber_scope inside(from.ber);
+    filter_guard child;
+    from.text.append("(!");
+    const int result = inside ? read_filter(from, depth + 1, child) : malformed("get_filter");
     if (result != LDAP_SUCCESS) {
-        return undefined_or_failed(result, read);
+        return result;
     }
-    return make_assertion_text(*read.filter, read.text);
+    if (!inside.at_end()) {
+        return malformed("get_filter");  // a NOT has one child
+    }
+    if (child == nullptr) {
+        filter.reset();
+    } else {
+        filter->f_list = child.release();
+        from.text.append(')');
+    }
+    return LDAP_SUCCESS;
+}
+
+int read_ava(const filter_source& from, Filter& filter)
+{
+    ava& assertion = filter.f_ava;
+    const int result = read_assertion(from.conn, from.ber, assertion, filter.f_choice, from.error_text);
+    if (result == LDAP_SUCCESS) {
+        from.text.append('(') && from.text.append(assertion.ava_type) &&
+            from.text.append(filter_comparison(filter.f_choice)) &&
+            append_expanded(from.text, assertion.ava_value.bv_val) && from.text.append(')');
+    }
+    return result;
 }
 
 int tell_too_deep(char** error_text)
@@ -450,37 +402,60 @@ int tell_too_deep(char** error_text)
     return LDAP_UNWILLING_TO_PERFORM;
 }
 
-// Reads a filter `depth` levels down.
-int read_filter(const filter_source& from, unsigned depth, filter_read& read)
+// Reads what the filter's choice says is there. The filter is released when its members make it undefined.
+int read_choice(const filter_source& from, unsigned depth, filter_guard& filter)
+{
+    switch (filter->f_choice) {
+    case LDAP_FILTER_AND:
+    case LDAP_FILTER_OR: return read_and_or(from, depth, filter);
+    case LDAP_FILTER_NOT: return read_not(from, depth, filter);
+    case LDAP_FILTER_EQUALITY:
+    case LDAP_FILTER_GE:
+    case LDAP_FILTER_LE:
+    case LDAP_FILTER_APPROX: return read_ava(from, *filter);
+    case LDAP_FILTER_PRESENT: return read_presence(from, filter);
+    case LDAP_FILTER_SUBSTRINGS: return read_substrings(from, filter->f_sub);
+    case LDAP_FILTER_EXTENDED:
+        debug_error("get_filter: extensibleMatch filter type is not supported\n");
+        ber_scanf(from.ber, "x");
+        return LDAP_NO_SUCH_ATTRIBUTE;
+    default:
+        debug_error("get_filter: unknown filter type %d\n", static_cast<int>(filter->f_choice));
+        return LDAP_PROTOCOL_ERROR;
+    }
+}
+
+// Reads a filter `depth` levels down; there is none when it is undefined.
+int read_filter(const filter_source& from, unsigned depth, filter_guard& filter)
 {
     if (depth > FILTER_MAX_DEPTH) {
         return tell_too_deep(from.error_text);
     }
-    read.filter.reset(static_cast<Filter*>(std::calloc(1, sizeof(Filter))));
-    if (read.filter == nullptr) {
+    filter.reset(static_cast<Filter*>(std::calloc(1, sizeof(Filter))));
+    if (filter == nullptr) {
         debug_error("Error - get_filter: malloc for f failed. Out of memory\n");
         return LDAP_NO_MEMORY;
     }
     ber_len_t length = 0;
-    const ber_tag_t tag = ber_peek_tag(from.ber, &length);
-    read.filter->f_choice = tag;
-    switch (tag) {
-    case LDAP_FILTER_AND:
-    case LDAP_FILTER_OR: return read_and_or(from, depth, read);
-    case LDAP_FILTER_NOT: return read_not(from, depth, read);
-    case LDAP_FILTER_EQUALITY:
-    case LDAP_FILTER_GE:
-    case LDAP_FILTER_LE:
-    case LDAP_FILTER_APPROX: return read_ava(from, read);
-    case LDAP_FILTER_PRESENT: return read_presence(from, read);
-    case LDAP_FILTER_SUBSTRINGS: return undefined_or_failed(read_substrings(from, read.filter->f_sub, read.text), read);
-    case LDAP_FILTER_EXTENDED:
-        debug_error("get_filter: extensibleMatch filter type is not supported\n");
-        ber_scanf(from.ber, "x");
-        read.filter.reset();
-        return LDAP_SUCCESS;
-    default: debug_error("get_filter: unknown filter type %d\n", static_cast<int>(tag)); return LDAP_PROTOCOL_ERROR;
+    filter->f_choice = ber_peek_tag(from.ber, &length);
+    const std::size_t start = from.text.length();
+    int result = read_choice(from, depth, filter);
+    // What makes an assertion undefined isn't a failure.
+    if (result == LDAP_NO_SUCH_ATTRIBUTE || result == LDAP_CONSTRAINT_VIOLATION) {
+        filter.reset();
+        result = LDAP_SUCCESS;
     }
+    if (filter == nullptr) {
+        from.text.cut(start);
+    }
+    return result;
+}
+
+// Hands the text over; LDAP_NO_MEMORY when it couldn't be written.
+int finish_text(text_builder& text, char** result, const char* function)
+{
+    *result = text.release().release();
+    return *result == nullptr ? tell_no_memory(function) : LDAP_SUCCESS;
 }
 
 }  // namespace
@@ -491,11 +466,12 @@ int get_filter(const Connection* conn, BerElement* ber, Filter** filter, char** 
 {
     *filter = nullptr;
     *text = nullptr;
-    filter_read read;
-    const int result = read_filter({conn, ber, error_text}, 1, read);
-    if (result == LDAP_SUCCESS && read.filter != nullptr) {
-        *filter = read.filter.release();
-        *text = read.text.release();
+    text_builder canonical(first_room);
+    filter_guard made;
+    int result = read_filter({conn, ber, error_text, canonical}, 1, made);
+    if (result == LDAP_SUCCESS && made != nullptr) {
+        result = finish_text(canonical, text, "get_filter");
+        *filter = result == LDAP_SUCCESS ? made.release() : nullptr;
     }
     return result;
 }
@@ -505,37 +481,30 @@ int get_filter_list(const Connection* conn, BerElement* ber, Filter** list, char
 {
     *list = nullptr;
     *text = nullptr;
-    filter_list filters;
-    text_builder joined(64);
-    const int result = read_list({conn, ber, error_text}, choice, 1, filters, joined);
-    if (result != LDAP_SUCCESS) {
-        return result;
+    text_builder joined(first_room);
+    filter_list members;
+    int result = read_list({conn, ber, error_text, joined}, choice, 1, members);
+    if (result == LDAP_SUCCESS && !members.empty()) {
+        result = finish_text(joined, text, "get_filter_list");
+        *list = result == LDAP_SUCCESS ? members.release() : nullptr;
     }
-    if (filters.empty()) {
-        return LDAP_SUCCESS;
-    }
-    heap_text made;
-    const int failed = finish_text(joined, made, "get_filter_list");
-    if (failed == LDAP_SUCCESS) {
-        *list = filters.release();
-        *text = made.release();
-    }
-    return failed;
+    return result;
 }
 
 int get_substring_filter(const Connection* conn, BerElement* ber, Filter* filter, char** text, char** error_text)
 {
+    *text = nullptr;
+    filter->f_choice = LDAP_FILTER_SUBSTRINGS;
     filter->f_sub = {};
-    heap_text made;
-    const int result = read_substrings({conn, ber, error_text}, filter->f_sub, made);
-    *text = made.release();
-    return result;
+    text_builder canonical(first_room);
+    const int result = read_substrings({conn, ber, error_text, canonical}, filter->f_sub);
+    return result == LDAP_SUCCESS ? finish_text(canonical, text, "get_substring_filter") : result;
 }
 
 int get_ava_for_filter(const Connection* conn, BerElement* ber, ava* assertion, std::uint64_t choice, char** error_text)
 {
     ava_init(assertion);
-    const int result = read_assertion({conn, ber, error_text}, *assertion, choice);
+    const int result = read_assertion(conn, ber, *assertion, choice, error_text);
     if (result != LDAP_SUCCESS) {
         ava_free(assertion, 0);
     }
@@ -558,10 +527,8 @@ int expand_filter_value(const char* value, unsigned long length, char** text)
 {
     *text = nullptr;
     text_builder expanded(3 * length + 1);
-    if (append_expanded(expanded, {value, length})) {
-        *text = expanded.release().release();
-    }
-    return *text == nullptr ? tell_no_memory("expand_filter_value") : LDAP_SUCCESS;
+    append_expanded(expanded, {value, length});
+    return finish_text(expanded, text, "expand_filter_value");
 }
 
 }  // extern "C"

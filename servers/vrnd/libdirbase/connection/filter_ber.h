@@ -9,8 +9,10 @@
 // lengths are held against the construction that they stand in; unknown members at the end of an assertion are passed
 // over, as the protocol asks (RFC 4511 section 4).
 //
-// Texts and records that these functions give are blocks of malloc for the caller to release. Each call works on what
-// it is given. The caller holds the read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g).
+// Texts and records that these functions give are blocks of malloc for the caller to release; pointers that take them
+// aren't null, except where it says so. Each call works on what it is given. The caller holds the read side of the
+// schema lock (ldcf_api_get_modify_attr_info_lock_g). A schema record that there is no memory for looks like an unknown
+// attribute, and a string like one that isn't there.
 #pragma once
 
 #include <cstdint>
@@ -38,7 +40,9 @@ extern "C" {
 //                                   of filter_check_attr_constraints
 //   LDAP_UNWILLING_TO_PERFORM       more than FILTER_MAX_DEPTH levels, with words for the client
 //   LDAP_INVALID_SYNTAX, or another failure of value_normalize
-//                                   a value isn't of its attribute's syntax, or a piece of a substring filter is empty
+//                                   a value isn't of its attribute's syntax or a text with a byte 0, or a piece of a
+//                                   substring filter is empty (one whose normal form is empty, as that of "-" in a
+//                                   telephone number, is legal)
 //   LDAP_NO_MEMORY
 // The position is behind the filter only when the result is LDAP_SUCCESS.
 DIRBASE_EXPORT int get_filter(const Connection* conn, BerElement* ber, Filter** filter, char** text, char** error_text);
@@ -52,13 +56,14 @@ DIRBASE_EXPORT int get_filter(const Connection* conn, BerElement* ber, Filter** 
 DIRBASE_EXPORT int get_filter_list(const Connection* conn, BerElement* ber, Filter** list, char** text,
                                    std::uint64_t choice, char** error_text);
 
-// Reads the substring filter at the position into the filter's f_sub, which is zeroed.
+// Reads the substring filter at the position into a record, whose f_choice and f_sub are set; what they held isn't
+// looked at.
 //
 //   text  takes the text; null on failure
 //
 // Returns what get_filter does, and where that is silent LDAP_NO_SUCH_ATTRIBUTE for an attribute that the schema
 // doesn't know, behind which the position is then, and LDAP_CONSTRAINT_VIOLATION for a piece longer than the
-// attribute's column. What was read before a failure is in the filter, for filter_free.
+// attribute's column. What was read before a failure is in the record, for filter_free.
 DIRBASE_EXPORT int get_substring_filter(const Connection* conn, BerElement* ber, Filter* filter, char** text,
                                         char** error_text);
 
@@ -72,7 +77,8 @@ DIRBASE_EXPORT int get_ava_for_filter(const Connection* conn, BerElement* ber, a
 // LDAP_PROTOCOL_ERROR with message 5 and the assertion zeroed.
 DIRBASE_EXPORT int get_ava(BerElement* ber, ava* assertion);
 
-// Whether a filter of this choice may be put to an attribute on this connection.
+// Whether a filter of this choice may be put to an attribute on this connection. get_filter asks for all choices but
+// presence.
 //
 //   info        null, for an attribute that isn't known, permits all
 //   error_text  may be null. Takes words for the client, a new block of 1000 bytes, when it is refused.

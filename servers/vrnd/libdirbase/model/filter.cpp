@@ -19,17 +19,6 @@ std::string_view view_of(const char* text)
     return text == nullptr ? std::string_view() : std::string_view(text);
 }
 
-// What stands between type and value.
-std::string_view comparison_of(std::uint64_t choice)
-{
-    switch (choice) {
-    case LDAP_FILTER_GE: return ">=";
-    case LDAP_FILTER_LE: return "<=";
-    case LDAP_FILTER_APPROX: return "~=";
-    default: return "=";
-    }
-}
-
 char operator_of(std::uint64_t choice)
 {
     return choice == LDAP_FILTER_AND ? '&' : choice == LDAP_FILTER_OR ? '|' : '!';
@@ -63,7 +52,7 @@ bool write(text_builder& text, const Filter& filter)
     }
     if (filter_has_ava(filter.f_choice)) {
         return text.append('(') && text.append(view_of(filter.f_ava.ava_type)) &&
-               text.append(comparison_of(filter.f_choice)) && text.append(view_of(filter.f_ava.ava_value.bv_val)) &&
+               text.append(filter_comparison(filter.f_choice)) && text.append(view_of(filter.f_ava.ava_value.bv_val)) &&
                text.append(')');
     }
     switch (filter.f_choice) {
@@ -127,7 +116,11 @@ char* filter2str(const Filter* filter)
         return nullptr;
     }
     text_builder text(first_room);
-    return write(text, *filter) ? text.release().release() : nullptr;
+    heap_text written = write(text, *filter) ? text.release() : nullptr;
+    if (text.failed()) {
+        debug_error("Error - filter2str: malloc failed. Out of memory\n");
+    }
+    return written.release();
 }
 
 void filter_print(const Filter* filter)

@@ -73,7 +73,7 @@ DIRBASE_EXPORT void filter_free(Filter* filter);
 
 // The text of a filter. Values stand as they are, up to their first zero byte, and nothing is escaped: the text of a
 // value with "(", ")", "*" or a backslash can't be parsed back. A new text for the caller to free(); null for a null
-// filter or child record, an unknown choice and without memory, which the debug log is told.
+// filter, and with a line in the debug log for an unknown choice and without memory.
 DIRBASE_EXPORT char* filter2str(const Filter* filter);
 
 // Prints that text and a line feed to standard output, for debugging; "(no filter)" where there is no text.
@@ -94,4 +94,13 @@ constexpr bool filter_has_ava(std::uint64_t choice)
 {
     return choice == LDAP_FILTER_EQUALITY || choice == LDAP_FILTER_GE || choice == LDAP_FILTER_LE ||
            choice == LDAP_FILTER_APPROX;
+}
+
+// What stands between type and value of an assertion.
+constexpr const char* filter_comparison(std::uint64_t choice)
+{
+    return choice == LDAP_FILTER_GE       ? ">="
+           : choice == LDAP_FILTER_LE     ? "<="
+           : choice == LDAP_FILTER_APPROX ? "~="
+                                          : "=";
 }

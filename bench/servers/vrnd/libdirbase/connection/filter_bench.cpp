@@ -37,22 +37,26 @@ void from_text(benchmark::State& state)
 }
 BENCHMARK(from_text)->Name("str2filter")->ArgName("normalize")->Arg(0)->Arg(1);
 
-void from_ber(benchmark::State& state)
+void measure_ber(benchmark::State& state, const Filter& filter)
 {
-    const filter_guard raw(str2filter(ordinary, 0));
-    std::string bytes = test_support::ber_of(*raw);
+    std::string bytes = test_support::ber_of(filter);
     measure(state, [&] {
         const berval value = {bytes.size(), bytes.data()};
         BerElement ber;
         ber_init2(&value, 0, &ber);
-        Filter* filter = nullptr;
+        Filter* read = nullptr;
         char* text = nullptr;
-        if (get_filter(nullptr, &ber, &filter, &text, nullptr) != 0 || filter == nullptr) {
+        if (get_filter(nullptr, &ber, &read, &text, nullptr) != 0 || read == nullptr) {
             throw std::runtime_error("the filter is refused");
         }
         std::free(text);
-        filter_free(filter);
+        filter_free(read);
     });
+}
+
+void from_ber(benchmark::State& state)
+{
+    measure_ber(state, *filter_guard(str2filter(ordinary, 0)));
 }
 BENCHMARK(from_ber)->Name("get_filter");
 
@@ -67,29 +71,27 @@ void to_text(benchmark::State& state)
 }
 BENCHMARK(to_text)->Name("filter2str");
 
-// Members of one list: the time for each may not grow with their number.
-void wide_list(benchmark::State& state)
+// Members of one list, and pieces of one attribute: the time for each may not grow with their number.
+void members(benchmark::State& state)
 {
-    std::string members;
+    std::string text;
     for (std::int64_t i = 0; i < state.range(0); ++i) {
-        members += "(uid=somebody)";
+        text += "(uid=somebody)";
     }
-    const filter_guard raw(str2filter(("(|" + members + ")").c_str(), 0));
-    std::string bytes = test_support::ber_of(*raw);
-    measure(state, [&] {
-        const berval value = {bytes.size(), bytes.data()};
-        BerElement ber;
-        ber_init2(&value, 0, &ber);
-        Filter* filter = nullptr;
-        char* text = nullptr;
-        if (get_filter(nullptr, &ber, &filter, &text, nullptr) != 0 || filter == nullptr) {
-            throw std::runtime_error("the filter is refused");
-        }
-        std::free(text);
-        filter_free(filter);
-    });
+    measure_ber(state, *filter_guard(str2filter(("(|" + text + ")").c_str(), 0)));
     state.SetItemsProcessed(state.iterations() * state.range(0));
 }
-BENCHMARK(wide_list)->Name("get_filter/members")->Arg(100)->Arg(100000);
+BENCHMARK(members)->Name("get_filter/members")->Arg(100)->Arg(100000);
+
+void pieces(benchmark::State& state)
+{
+    std::string text;
+    for (std::int64_t i = 0; i < state.range(0); ++i) {
+        text += "*a";
+    }
+    measure_ber(state, *filter_guard(str2filter(("(uid=" + text + ")").c_str(), 0)));
+    state.SetItemsProcessed(state.iterations() * state.range(0));
+}
+BENCHMARK(pieces)->Name("get_filter/pieces")->Arg(100)->Arg(100000);
 
 }  // namespace

@@ -5,6 +5,7 @@
 #include "libraries/libpwd/pwd_format.h"
 #include "servers/vrnd/libdirbase/base/server_globals.h"
 #include "tests/servers/vrnd/libdirbase/connection/filter_fixture.h"
+#include "tests/servers/vrnd/libdirbase/model/active_schema.h"
 #include "tests/support/message_catcher.h"
 
 using namespace model_test;
@@ -19,10 +20,11 @@ using GetFilter = Model;
 
 TEST_F(GetFilter, NormalisesWhatItKnowsAndLeavesOutWhatItDoesNot)
 {
-    const std::string too_long(info_of("cn")->attr->length + 1u, 'x');
+    const std::string longest(info_of("cn")->attr->length, 'X');
+    const std::string too_long = longest + "X";
     const struct {
         std::string filter;
-        const char* told;
+        std::string told;
     } cases[] = {
         {"(CN=Bob Smith)", "(cn=BOB SMITH)"},
         {"(CommonName;x=a)", "undefined"},  // tags are switched off
@@ -54,6 +56,9 @@ TEST_F(GetFilter, NormalisesWhatItKnowsAndLeavesOutWhatItDoesNot)
         {"(|(&(cn=a)(nosuch=*))(sn=b))", "(|(sn=B))"},
         {"(&)", "undefined"},
         {"(|)", "undefined"},
+        {"(cn=" + longest + ")", "(cn=" + longest + ")"},
+        {"(cn=*" + longest + ")", "(cn=*" + longest + ")"},
+        {"(member=cn=x, " + longest.substr(15) + "=y)", "17"},
         {"(cn=" + too_long + ")", "undefined"},
         {"(cn=*" + too_long + ")", "undefined"},
         {"(debug=any\\01thing)", "(debug=any\x01thing)"},
@@ -67,16 +72,18 @@ TEST_F(GetFilter, NormalisesWhatItKnowsAndLeavesOutWhatItDoesNot)
         {"(twoWay=a*)", "53"},
         {"(twoWay=*)", "(twoway=*)"},
         {"(cert=\\00\\01\\02)", "(cert=)"},
+        {"(cn=a\\00)", "21"},
     };
     for (const auto& test : cases) {
         const filter_answer answer = read_filter_text(test.filter.c_str());
         EXPECT_EQ(told(answer), test.told) << test.filter;
         EXPECT_EQ(answer.filter != nullptr, answer.text != nullptr);
-        EXPECT_TRUE(answer.at_end || answer.result != 0) << test.filter;
-        if (answer.filter != nullptr && std::strchr(test.told, '\\') == nullptr) {
-            EXPECT_STREQ(owned(filter2str(answer.filter.get())).get(), test.told);
+        EXPECT_TRUE(answer.left == 0 || answer.result != 0) << test.filter;
+        if (answer.filter != nullptr && test.told.find('\\') == std::string::npos) {
+            EXPECT_EQ(owned(filter2str(answer.filter.get())).get(), test.told);
         }
     }
+    EXPECT_EQ(read_filter_text("(cert=\\00\\01\\02)").filter->f_ava.ava_value.bv_len, 3u);
     set_g_language_tags_enabled(1);
     EXPECT_EQ(told(read_filter_text("(cn;lang-DE=a)")), "(cn;lang-de=A)");
     set_g_language_tags_enabled(0);
@@ -118,16 +125,27 @@ TEST_F(GetFilter, TakesNoBytesFromBeyondAConstruction)
                                               "a")),
          "2"},
         {"extensible match", ber_value(0xa1, ber_value(0xa9, ber_value(0x82, "cn")) + equality), "(|(cn=A))"},
-        {"what stands behind the filter stays", equality, "(cn=A)"},
+        {"a list in a primitive value", ber_value(0xa2, ber_value(0x80, equality)), "2"},
     };
     for (const auto& test : cases) {
         EXPECT_EQ(told(read_filter(test.bytes)), test.told) << test.what;
     }
     const std::string whole =
         ber_value(0xa0, equality + pieces(ber_value(0x80, "a")) + ber_value(0xa2, ber_value(0x87, "sn")));
-    EXPECT_EQ(told(read_filter(whole + "more")), "(&(cn=A)(cn=A*)(!(sn=*)))");
-    for (std::size_t length = 0; length < whole.size(); ++length) {
-        EXPECT_EQ(told(read_filter(whole.substr(0, length))), "2") << length;
+    const filter_answer answer = read_filter(whole + "more");
+    EXPECT_EQ(told(answer), "(&(cn=A)(cn=A*)(!(sn=*)))");
+    EXPECT_EQ(answer.left, 4u);
+    // Cut anywhere, inside of lengths that hold.
+    const std::string substrings = pieces(ber_value(0x80, "a"));
+    for (const std::string& member : {equality, substrings, ber_value(0xa2, equality)}) {
+        for (std::size_t length = 1; length < member.size(); ++length) {
+            std::string cut = member.substr(0, length);
+            EXPECT_EQ(told(read_filter(ber_value(0xa0, cut))), "2") << length;
+            if (length >= 2) {
+                cut[1] = static_cast<char>(length - 2);
+                EXPECT_EQ(told(read_filter(ber_value(0xa0, cut))), "2") << length;
+            }
+        }
     }
 }
 
@@ -181,12 +199,51 @@ TEST_F(GetFilter, TellsWhoSentAnAssertionThatIsNone)
     EXPECT_TRUE(debug.has("Error - get_ava_for_filter: SBER_SCANF failed.\n"));
 }
 
+TEST_F(GetFilter, AsksWhatTheConnectionMayAsk)
+{
+    Connection open, secure;
+    secure.c_ssl = 1;
+    info_of("cn")->secure_connection = 1;
+    info_of("sn")->non_matchable = 1;
+    for (const char* const filter : {"(cn=a)", "(cn<=a)", "(cn=a*)", "(|(sn=*)(!(cn=a)))"}) {
+        const filter_answer refused = read_filter_text(filter, &open);
+        EXPECT_EQ(told(refused), "13") << filter;
+        EXPECT_STREQ(refused.error_text.get(), "The attribute cn can be searched for only over a secure connection.");
+        EXPECT_EQ(read_filter_text(filter, &secure).result, 0) << filter;
+    }
+    EXPECT_EQ(told(read_filter_text("(sn=a)", &secure)), "53");
+    EXPECT_EQ(told(read_filter_text("(sn=a*)", &secure)), "53");
+}
+
+TEST_F(GetFilter, TellsTheDebugLogWhyThereIsNoFilter)
+{
+    const std::string cn = ber_string("cn");
+    const struct {
+        std::string bytes;
+        const char* line;
+    } cases[] = {
+        {ber_value(0xaa, ""), "get_filter: unknown filter type 170\n"},
+        {ber_value(0xa9, ""), "get_filter: extensibleMatch filter type is not supported\n"},
+        {ber_value(0xa3, ber_string("x") + cn), "get_ava_for_filter: Unknown attribute in filter.\n"},
+        {ber_value(0xa3, cn + ber_value(4, std::string(5000, 'x'))),
+         "get_ava_for_filter: value specified exceeds attribute length in schema.\n"},
+        {ber_value(0xa4, cn + ber_value(0x30, ber_value(0x80, ""))), "get_substring_filter: Invalid syntax\n"},
+        {ber_value(0xa4, cn + ber_value(0x30, ber_value(0x83, "a"))), "get_substring_filter: unknown type\n"},
+        {ber_value(0xa4, cn + ber_value(0x30, ber_value(0x80, std::string(5000, 'x')))),
+         "get_substring_filter: value longer than schema allows.\n"},
+    };
+    for (const auto& test : cases) {
+        const debug_catcher debug;
+        EXPECT_EQ(read_filter(test.bytes).filter, nullptr);
+        EXPECT_TRUE(debug.has(test.line)) << test.line;
+    }
+}
+
 TEST_F(GetFilter, EncodesTheValueOfATwoWayAttribute)
 {
     filter_answer answer = read_filter_text("(twoWay=secret)");
     ASSERT_EQ(told(answer), "(twoway=SECRET)");
     ava& assertion = answer.filter->f_ava;
-    const heap_chars clear = owned(nullptr);
     char* text = nullptr;
     unsigned long length = 0;
     ASSERT_EQ(
@@ -220,6 +277,26 @@ TEST_F(GetFilter, ListsAndAssertionsCanBeReadByThemselves)
         EXPECT_EQ(list != nullptr, test.text != nullptr);
         for (; list != nullptr; filter_free(std::exchange(list, list->f_next))) {}
     }
+    for (const char* const filter : {"(nosuch=a)", "(cn=a\\00)", "(cn=%)", "(oneWay=a)"}) {
+        filter_guard raw(str2filter(filter, 0));
+        if (std::strchr(filter, '%') != nullptr) {
+            std::free(raw->f_ava.ava_value.bv_val);
+            raw->f_ava.ava_value = {5000, ::strdup(std::string(5000, 'x').c_str())};
+        }
+        ber_input input(test_support::ber_of(*raw));
+        ava assertion;
+        const int result = get_ava_for_filter(nullptr, input.get(), &assertion, LDAP_FILTER_EQUALITY, nullptr);
+        EXPECT_EQ(result, filter[1] == 'n' ? 16 : filter[1] == 'o' ? 53 : filter[4] == '%' ? 19 : 21) << filter;
+        EXPECT_TRUE(assertion.ava_type == nullptr && assertion.ava_value.bv_val == nullptr);
+    }
+    for (const char* const filter : {"(nosuch=a*b*)", "(cn=a*b*)"}) {
+        ber_input input(test_support::ber_of(*filter_guard(str2filter(filter, 0))));
+        const filter_guard record(static_cast<Filter*>(std::calloc(1, sizeof(Filter))));
+        char* text = nullptr;
+        EXPECT_EQ(get_substring_filter(nullptr, input.get(), record.get(), &text, nullptr), filter[1] == 'n' ? 16 : 0);
+        EXPECT_STREQ(owned(text).get(), filter[1] == 'n' ? nullptr : "(cn=A*B*)");
+        EXPECT_STREQ(record->f_sub.f_sub_type, filter[1] == 'n' ? "nosuch" : "cn");
+    }
     const struct {
         const char* type;
         const char* value;
@@ -233,6 +310,48 @@ TEST_F(GetFilter, ListsAndAssertionsCanBeReadByThemselves)
         EXPECT_EQ(assertion.ava_value.bv_len, std::strlen(test.normal));
         ava_free(&assertion, 0);
         EXPECT_EQ(assertion.ava_type, nullptr);
+    }
+}
+
+TEST(ExpandFilterValue, EscapesFourBytes)
+{
+    const debug_catcher debug(LDAP_DEBUG_TRACE);
+    char* text = nullptr;
+    ASSERT_EQ(expand_filter_value("(a\0*)\\\xff", 7, &text), LDAP_SUCCESS);
+    EXPECT_EQ(std::memcmp(text, "\\28a\0\\2a\\29\\5c\xff", 16), 0);
+    std::free(text);
+    ASSERT_EQ(expand_filter_value(nullptr, 0, &text), LDAP_SUCCESS);
+    EXPECT_STREQ(owned(text).get(), "");
+    for (const std::size_t length : {8099u, 8100u}) {
+        ASSERT_EQ(expand_filter_value(std::string(length, 'x').c_str(), length, &text), LDAP_SUCCESS);
+        EXPECT_EQ(std::strlen(text), length);
+        std::free(text);
+    }
+    EXPECT_TRUE(debug.has("expand_filter_value: " + std::string(8099, 'x') + "\n"));
+    EXPECT_TRUE(debug.has("expand_filter_value: too long\n"));
+}
+
+class GetFilterShipped : public with_active_schema {};
+
+TEST_F(GetFilterShipped, PiecesHaveTheNormalFormOfTheirSyntax)
+{
+    const struct {
+        const char* filter;
+        const char* told;
+    } cases[] = {
+        {"(c=u*)", "(c=U*)"},
+        {"(c=*S)", "(c=*S)"},
+        {"(c=1*)", "(c=1*)"},  // of one character anything is taken
+        {"(c=u1*)", "21"},
+        {"(c=u)", "21"},
+        {"(telephoneNumber=+1 2-3*4 5)", "(telephonenumber=+123*45)"},
+        {"(telephoneNumber=*-*)", "(telephonenumber=**)"},
+        {"(seeAlso=cn = X*)", "(seealso=CN=X*)"},
+        {"(seeAlso=*x,c=*)", "(seealso=*X,C=*)"},
+        {"(seeAlso=nosuch=x*)", "17"},
+    };
+    for (const auto& test : cases) {
+        EXPECT_EQ(told(read_filter_text(test.filter)), test.told) << test.filter;
     }
 }
 

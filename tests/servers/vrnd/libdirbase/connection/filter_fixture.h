@@ -29,7 +29,7 @@ public:
         ber_init2(&value, 0, &ber_);
     }
     BerElement* get() { return &ber_; }
-    bool at_end() const { return ber_.ber_ptr == ber_.ber_end; }
+    std::size_t left() const { return static_cast<std::size_t>(ber_.ber_end - ber_.ber_ptr); }
 
 private:
     std::unique_ptr<char[]> bytes_;
@@ -41,7 +41,7 @@ struct filter_answer {
     filter_guard filter;
     heap_chars text = owned(nullptr);
     heap_chars error_text = owned(nullptr);
-    bool at_end = false;
+    std::size_t left = 0;  // bytes behind the position
 };
 
 inline filter_answer read_filter(const std::string& bytes, const Connection* conn = nullptr)
@@ -55,7 +55,7 @@ inline filter_answer read_filter(const std::string& bytes, const Connection* con
     answer.filter.reset(filter);
     answer.text = owned(text);
     answer.error_text = owned(error_text);
-    answer.at_end = input.at_end();
+    answer.left = input.left();
     return answer;
 }
 
