@@ -14,11 +14,12 @@ class csgl_output;
 
 class DIRBASE_EXPORT exc_t {
 public:
-    // Builds the message and logs it with severity 8.
+    // Builds the message and logs it with severity 8. When there is no memory for that, exc_not_enough_memory_t comes in
+    // place of the exception.
     //
     //   file, line  the raising place; the text of file is kept, not copied. For a fault in schema text it is the name
     //               of the source, which lives as long as the source's reader: a handler further up must not use it.
-    //   text        the message with its markers (csgl_message.h)
+    //   text        the message with its markers (csgl_message.h); null is the empty one
     //   code        the class's number, an LDAP result code in exc_ldap_rc_t, a foreign code in exc_unmapped_t
     //   message_id  message and catalogue number (csgl_get_msgid, csgl_get_catid); 0 logs nothing
     exc_t(const char* file, int line, const char* text, std::int64_t code, int message_id);

@@ -43,6 +43,14 @@ void check_size(unsigned size)
     }
 }
 
+const char* not_null(const char* path)
+{
+    if (path == nullptr) {
+        throw exc_assertion_failed_t(__FILE__, __LINE__, "unexpected null pointer", 0);
+    }
+    return path;
+}
+
 int open_flags(action_indicator action, access_requested_indicator access, access_denied_indicator denied)
 {
     int flags = O_CLOEXEC;
@@ -74,7 +82,7 @@ int open_path(const char* path, action_indicator action, access_requested_indica
 {
     const int flags = open_flags(action, access, denied);
     struct stat before {};
-    const bool existed = ::stat(path, &before) == 0;
+    const bool existed = ::stat(not_null(path), &before) == 0;
     const int handle = checked(::open(path, flags, new_file_permissions), __LINE__);
     if (existed) {
         // A file that is emptied and written anew keeps its owner also when the process runs as somebody else; where
@@ -124,7 +132,14 @@ bool same_directory(const char* a, const char* b)
 // How the two names of a rename stand to each other.
 enum class two_names { of_two_files, of_one_file, equal };
 
-// A target that is a symbolic link is no second name: removing it loses no file.
+bool is_link(const char* path)
+{
+    struct stat status {};
+    return ::lstat(path, &status) == 0 && S_ISLNK(status.st_mode);
+}
+
+// A target that is a symbolic link is no second name, for removing it loses no file; but when the source is a link too,
+// it might lead to its file through the target.
 two_names compare_names(const char* from, const char* to)
 {
     if (base_name(from) == base_name(to) && same_directory(from, to)) {
@@ -132,7 +147,8 @@ two_names compare_names(const char* from, const char* to)
     }
     struct stat from_stat {};
     struct stat to_stat {};
-    const bool one_file = ::stat(from, &from_stat) == 0 && ::lstat(to, &to_stat) == 0 && same_file(from_stat, to_stat);
+    const bool one_file = ::stat(from, &from_stat) == 0 && ::lstat(to, &to_stat) == 0 &&
+                          (same_file(from_stat, to_stat) || (is_link(from) && lead_to_one_file(from, to)));
     return one_file ? two_names::of_one_file : two_names::of_two_files;
 }
 
@@ -216,10 +232,7 @@ csgl_file::timestamp csgl_file::get_last_mod_time() const
 
 csgl_string csgl_file::canonize(const char* path)
 {
-    if (path == nullptr) {
-        throw exc_assertion_failed_t(__FILE__, __LINE__, "unexpected null pointer", 0);
-    }
-    if (*path == '/') {
+    if (*not_null(path) == '/') {
         return path;
     }
     const std::size_t length = std::strlen(path);
@@ -242,6 +255,7 @@ void csgl_file::copy(const char* from, const char* to)
 void csgl_file::copy(const char* from, const char* to, force_indicator)
 {
     csgl_file source(from, csgl_file_open_existing, csgl_file_read, csgl_file_deny_none);
+    not_null(to);
     if (lead_to_one_file(from, to)) {
         return;  // opening the target would empty the source
     }
@@ -262,6 +276,7 @@ void csgl_file::rename(const char* from, const char* to)
 
 void csgl_file::rename(const char* from, const char* to, force_indicator)
 {
+    not_null(from);
     if (exists(to)) {
         switch (compare_names(from, to)) {
         case two_names::equal: return;
@@ -269,7 +284,10 @@ void csgl_file::rename(const char* from, const char* to, force_indicator)
         case two_names::of_two_files: break;
         }
         struct stat status {};
-        checked(::lstat(from, &status), __LINE__);  // without a source the target isn't touched
+        checked(::lstat(from, &status), __LINE__);  // what can't be linked leaves the target alone
+        if (S_ISDIR(status.st_mode)) {
+            exc_t::throw_posix_error(__FILE__, __LINE__, EPERM);
+        }
         remove(to);
     }
     checked(::link(from, to), __LINE__);
@@ -278,13 +296,13 @@ void csgl_file::rename(const char* from, const char* to, force_indicator)
 
 void csgl_file::remove(const char* path)
 {
-    checked(::unlink(path), __LINE__);
+    checked(::unlink(not_null(path)), __LINE__);
 }
 
 bool csgl_file::exists(const char* path)
 {
     struct stat status {};
-    return ::stat(path, &status) == 0;
+    return ::stat(not_null(path), &status) == 0;
 }
 
 csgl_file& csgl_file::std_input()
@@ -350,7 +368,9 @@ void csgl_output_file::flush()
     if (size == 0) {
         return;
     }
-    if (write(begin_, size) != size) {
+    if (const unsigned written = write(begin_, size); written != size) {
+        std::memmove(begin_, begin_ + written, size - written);  // only the rest is written the next time
+        current_ -= written;
         throw exc_not_enough_disk_t(__FILE__, __LINE__, "exc_not_enough_disk", 0);
     }
     current_ = begin_;

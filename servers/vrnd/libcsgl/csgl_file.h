@@ -2,7 +2,8 @@
 //
 // A file object belongs to one thread at a time; a duplicate shares its position with the object it was made from. No
 // exception of this file carries a message id. Failed system calls raise by exc_t::throw_posix_error: a missing file is
-// exc_does_not_exist_t, one that is in the way exc_already_exists_t, a refusal exc_permission_denied_t, and so on.
+// exc_does_not_exist_t, one that is in the way exc_already_exists_t, a refusal exc_permission_denied_t, and so on. A
+// null path is exc_assertion_failed_t. Programs that the process starts inherit none of the handles.
 #pragma once
 
 #include <cstdint>
@@ -101,17 +102,19 @@ public:
 
     [[noreturn]] timestamp get_last_mod_time() const;
 
-    // A path made absolute by the working directory; "." and ".." and links stay.
+    // A path made absolute by the working directory, of at most 1023 bytes; "." and ".." and links stay.
     static csgl_string canonize(const char* path);
 
     // Copies a file. The first form refuses an existing target (exc_already_exists_t). A failed copy leaves a partly
-    // written target. A file copied onto itself stays as it is.
+    // written target, an empty one when the source can be opened and not read. A file copied onto itself stays as it
+    // is.
     static void copy(const char* from, const char* to);
     static void copy(const char* from, const char* to, force_indicator force);
 
     // Renames a file within a file system. The first form refuses an existing target; the second removes it first, so
     // for a moment no file stands under the target's name. Two names of one file lose the first name and keep the file;
-    // a name renamed to itself is left alone.
+    // a name renamed to itself is left alone. A link at the target that leads nowhere counts as none, and is in the
+    // way. Between file systems a forced rename fails with the target gone.
     static void rename(const char* from, const char* to);
     static void rename(const char* from, const char* to, force_indicator force);
 

@@ -1,6 +1,7 @@
 // Messages with markers: see csgl_message.h.
 #include "servers/vrnd/libcsgl/csgl_message.h"
 
+#include <algorithm>
 #include <cstring>
 #include <string_view>
 #include <utility>
@@ -111,6 +112,9 @@ bool csgl_message_::try_init(const char* text, unsigned length, int number, cons
     file_ = file;
     line_ = line;
     parameter_count_ = 0;
+    variable_ = nullptr;
+    printed_ = nullptr;
+    std::fill_n(parameters_, parameter_limit, nullptr);
 
     const std::size_t file_length = file == nullptr ? 0 : std::strlen(file);
     const std::size_t size = 4 * allocation_size(std::size_t{length} + 1 + file_length);

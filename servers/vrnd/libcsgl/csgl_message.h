@@ -27,7 +27,8 @@ public:
     bool try_init(const char* text, unsigned length, int number, const char* file, int line) noexcept;
 
     // Writes the message to the message log and keeps its rendering, unless the number is 0. A number below 0 names a
-    // catalogue text with the parameters alone, one above 0 a text with place and line ahead of them.
+    // catalogue text with the parameters alone, one above 0 a text with place and line ahead of them. Called once, after
+    // the message was taken apart.
     void log(int severity, int catalogue);
 
     const char* text() const { return text_; }
@@ -37,6 +38,8 @@ public:
     int line() const { return line_; }
     const char* file() const { return file_; }
     int parameter_count() const { return parameter_count_; }
+
+    // From 0 to parameter_limit - 1; null from parameter_count() on.
     const char* parameter(int index) const { return parameters_[index]; }
 
     // The unit of a block's size for `n` bytes.

@@ -30,6 +30,9 @@ const csgl_string& empty_string()
     return empty;
 }
 
+// So that it is there before the program's own static objects, and goes after them.
+[[maybe_unused]] const csgl_string& empty_made_at_load = empty_string();
+
 }  // namespace
 
 csgl_string_::~csgl_string_()

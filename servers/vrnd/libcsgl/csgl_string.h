@@ -85,7 +85,7 @@ public:
     int rfind(char c, unsigned start = 0xffffffff) const;
 
     // Compares byte by byte with the bytes taken as signed: -1, 0 or 1.
-    static int compare(const char* a, const char* b);
+    static int compare(const char* a, const char* b);  // neither null
 
     friend bool operator==(const csgl_string& a, const csgl_string& b)
     {

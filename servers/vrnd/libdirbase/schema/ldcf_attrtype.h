@@ -86,17 +86,22 @@ public:
     // leave a type that was found there partly filled.
     static void parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_attrtype>& map);
 
-    // Reads one extended definition, which names its type by oid or by a name that is known already.
+    // Reads one extended definition, which names its type by oid or by a name that is known already. Raises the
+    // exceptions of the token layer, exc_invalid_grammar_t for a second extended definition of a type and
+    // exc_invalid_state_t for a type that is being completed or complete. A failure may leave a type that was found
+    // partly filled.
     static void parse_xan(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_attrtype>& map);
 
-    // Reads the value of SYNTAX, as 1.2.3, 1.2.3{64} or either between quotes, into `attribute`.
+    // Reads the value of SYNTAX, as 1.2.3, 1.2.3{64} or either between quotes, into `attribute`. Raises the exceptions
+    // of the token layer; the oid may have been set then.
     static void parse_attrtype_syntax(ldcf_attrtype* attribute, ldcf_token_factory& factory);
 
     // Puts the last token back and fails with the text of a bad SYNTAX.
     [[noreturn]] static void throw_syntax_error(ldcf_token_factory& factory);
 
     // True when one of a null-terminated array of standard definition texts is that of `attribute`, a name, a numeric
-    // oid or "oid." and an oid. A text that can't be read is no match.
+    // oid or "oid." and an oid. A text that can't be read is no match, with a message in the log; only oids and quoted
+    // texts in front of NAME make one so. False for a null argument, and when memory ran out.
     static bool attributeTypesContainsAttr(char** definitions, char* attribute);
 
     const csgl_string& oid() const;

@@ -130,7 +130,7 @@ ldcf_attrtype_* ldcf_attrtype_::link_supertype(const attribute_map& attributes)
     found->subtypes_.insert(ldcf_attrtype(this));
     if (usage_ != found->usage_) {
         LDCF_THROW_INPUT(("[p[" LDCF_KIND_ATTRIBUTE_TYPE "]p] ", ldcf_quoted_parameter(primary_name_),
-                          " and its supertype ", ldcf_quoted_parameter(found->primary_name_), " have different usages"),
+                          " and its supertype ", ldcf_quoted_parameter(name_or_oid(*found)), " have different usages"),
                          LDCF_MSG_USAGE_DIFFERS);
     }
     return found.get();
@@ -158,7 +158,7 @@ void ldcf_attrtype_::inherit()
 {
     const ldcf_attrtype_& from = *supertype_;
     const auto take = [](csgl_string& item, const csgl_string& inherited_item, bool& inherited) {
-        if (item.empty()) {
+        if (item.empty() && !inherited_item.empty()) {
             item = inherited_item;
             inherited = true;
         }
@@ -208,6 +208,7 @@ ldcf_matchrule ldcf_attrtype_::resolve_rule(const char* keyword, csgl_string& ru
 // Values that the server itself compares, orders or shows must stay readable in the store.
 void ldcf_attrtype_::check_encryption()
 {
+    may_be_encrypted_ = true;  // a completion before this one may have found otherwise
     const bool encrypted = encryption_ != ldcf_encryption::none;
     bool plain_syntax = false;
     for (const char* syntax_oid : never_encrypted_syntaxes) {

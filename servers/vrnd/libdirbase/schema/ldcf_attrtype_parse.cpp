@@ -318,7 +318,7 @@ void ldcf_attrtype::parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_
     ldcf_attrtype_parser(factory, attribute).read_v3();
 
     if (body.primary_name_.empty()) {
-        body.primary_name_ = oid;
+        body.primary_name_ = body.oid_;
     }
     for (const csgl_string& name : body.names_) {
         if (map.count(name) != 0) {

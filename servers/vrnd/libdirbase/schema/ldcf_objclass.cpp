@@ -117,7 +117,7 @@ const csgl_string& ldcf_objclass_::v3_string() const
 {
     return v3_string_.get([this] {
         csgl_string text = ldcf_join("( ", oid_, " ");
-        text.append(ldcf_stream::qdescrs("NAME", names_, primary_name_));
+        text.append(ldcf_stream::qdescrs("NAME", names_, primary_name_.empty() ? oid_ : primary_name_));
         if (!description_.empty()) {
             text.append("DESC '").append(description_).append("' ");
         }

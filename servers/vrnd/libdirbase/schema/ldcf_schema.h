@@ -64,15 +64,15 @@ public:
     ldcf_schema& copy(const ldcf_schema& from);
 
     // Take a definition in: it is homed in current_file and linked. An oid or name that exists is exc_ldap_rc_t with
-    // 20.
+    // 20. No other schema may hold it any longer: that one unlinks it when it is cleared or goes.
     void insert(ldcf_syntax& definition);
     void insert(ldcf_matchrule& definition);
     void insert(ldcf_attrtype& definition);
     void insert(ldcf_objclass& definition);
 
-    // Take the definition out that has the oid of the given one, which may be any parsed definition. An oid or name
-    // that doesn't exist is exc_ldap_rc_t with 16, names of another definition are exc_invalid_input_t, and a
-    // definition that others use is exc_invalid_state_t.
+    // Take the definition out that has the oid of the given one, or that name in its place; it may be any parsed one.
+    // An oid or name that doesn't exist is exc_ldap_rc_t with 16, names of another definition are exc_invalid_input_t,
+    // and a definition that others use is exc_invalid_state_t.
     void erase(ldcf_syntax& definition);
     void erase(ldcf_matchrule& definition);
     void erase(ldcf_attrtype& definition);

@@ -215,7 +215,8 @@ template <typename T, typename Map>
 void ldcf_schema::replace_in(const char* kind, T& definition, Map& map)
 {
     T found = ldcf_find(map, definition.oid());
-    if (!found) {
+    // The map knows names as well: a definition that only has the given oid as a name is another one.
+    if (!found || csgl_str_ci_compare(found.oid(), definition.oid()) != 0) {
         throw_does_not_exist(kind, definition.oid(), LDCF_MSG_REPLACE_NOT_THERE);
     }
     for (const csgl_string& name : definition->names()) {
@@ -230,7 +231,12 @@ void ldcf_schema::replace_in(const char* kind, T& definition, Map& map)
         }
     }
     incomplete();
+    const csgl_string key = found.oid();
     found.replace(definition);
+    // Walks know a definition by the key that is its oid to the letter, which may be in another case now.
+    auto entry = map.extract(key);
+    entry.key() = found.oid();
+    map.insert(std::move(entry));
     complete();
     complete_db_names();
     mark_files(files, definition);

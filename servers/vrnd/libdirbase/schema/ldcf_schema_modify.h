@@ -31,9 +31,10 @@ enum ldcf_modify_phase : int {
 
 extern "C" {
 
-// Run one phase of a change of one definition, the same in all phases. An added definition becomes part of the schema;
-// one to delete or replace is given as parsed. Return 0, or -1 for a phase outside the four. The back end isn't used. A
-// commit without a vote that went through just before is exc_invalid_state_t and changes nothing.
+// Run one phase of a change of one definition, the same in all phases. An added definition becomes part of the schema:
+// no other ldcf_schema may hold it any longer, for that unlinks it when it is cleared or goes. One to delete or replace
+// is given as parsed. Return 0, or -1 for a phase outside the four. The back end isn't used. A commit without a vote
+// that went through just before is exc_invalid_state_t and changes nothing.
 //
 // A replaced attribute type whose protection (encryption, returned value, secure connection, matching) changes is told
 // to the message log after the commit.
