@@ -49,7 +49,7 @@
 #include "servers/vrnd/libdirbase/model/entry_mods.h"
 #include "servers/vrnd/libdirbase/model/entry_text.h"
 #include "servers/vrnd/libdirbase/model/filter.h"
-#include "servers/vrnd/libdirbase/model/filter_test.h"
+#include "servers/vrnd/libdirbase/model/filter_evaluation.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
 #include "servers/vrnd/libdirbase/model/ldap_mods.h"
 #include "servers/vrnd/libdirbase/model/log_file_check.h"

@@ -1,7 +1,7 @@
 // Search filters: the tree, its release, and its text (RFC 4511 section 4.5.1, RFC 4515).
 //
 // A filter is a tree of records. It comes from BER (connection/filter_ber.h) or from text (str2filter.h), and is then
-// nested FILTER_MAX_DEPTH deep at most; test_filter (filter_test.h) evaluates it. Everything here descends by
+// nested FILTER_MAX_DEPTH deep at most; test_filter (filter_evaluation.h) evaluates it. Everything here descends by
 // recursion, a small frame for each level, so it is safe at that depth. Records, texts and arrays are blocks of malloc
 // that the filter owns.
 //

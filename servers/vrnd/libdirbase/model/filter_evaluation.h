@@ -37,14 +37,15 @@ extern "C" {
 DIRBASE_EXPORT int test_filter(const Entry* entry, const Filter* filter);
 
 // The filters from `first` on along f_next, joined by LDAP_FILTER_AND or LDAP_FILTER_OR; a list without members is
-// false.
+// false. LDAP_OPERATIONS_ERROR for another choice.
 DIRBASE_EXPORT int test_filter_list(const Entry* entry, const Filter* first, std::uint64_t choice);
 
 // Equality or an ordering. Of an attribute encrypted two ways the decoded values count where there are any, of one
-// encrypted one way the assertion is the password in the clear and only the first version is asked.
+// encrypted one way the assertion is the password in the clear and only the first version is asked; orderings see the
+// stored form of either. Where value_cmp can't compare, as with a bad time, the stored value counts as the greater one.
 DIRBASE_EXPORT int test_ava_filter(const Entry* entry, const ava* assertion, std::uint64_t choice);
 
-// Whether the entry has a version of the attribute.
+// Whether the entry has a version of the attribute; false for null arguments.
 DIRBASE_EXPORT int test_presence_filter(const Entry* entry, const char* type);
 
 // Approximate match: the phonetic codes, from the first word on, are the same.
