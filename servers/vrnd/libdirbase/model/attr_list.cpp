@@ -33,12 +33,16 @@ bool has_tag(const char* tag)
 
 bool is_tagged(const Attribute& attr)
 {
-    return has_tag(find_language_tag(attr.a_type));
+    const named_attribute* const named = named_attribute::of(attr);
+    return named != nullptr ? named->is_tagged : has_tag(find_language_tag(attr.a_type));
 }
 
 bool is_version(const Attribute& attr, const asyntaxinfo* info, const char* tag)
 {
-    return attr.a_info == info && strtagcmp(find_language_tag(attr.a_type), tag) == 0;
+    if (attr.a_info != info) {
+        return false;
+    }
+    return has_tag(tag) ? strtagcmp(find_language_tag(attr.a_type), tag) == 0 : !is_tagged(attr);
 }
 
 // The entry's slot for an attribute, where it has one for this version; else null.
@@ -130,6 +134,7 @@ Attribute* new_attribute(const char* name, asyntaxinfo* info)
     std::memcpy(attr.a_type, name, size);
     attr.a_syntax = static_cast<std::int32_t>(info == nullptr ? SC_CIS : info->syntax);
     attr.a_info = info;
+    made->is_tagged = has_tag(find_language_tag(name));
     made->type_length = static_cast<std::size_t>(strchrnul(name, ':') - name);
     return &attr;
 }
@@ -143,6 +148,7 @@ void link_attribute(Entry& entry, Attribute& attr, const sorted_neighbours& plac
     attr.a_prev = entry.e_attrs_tail;
     (entry.e_attrs_tail == nullptr ? entry.e_attrs : entry.e_attrs_tail->a_next) = &attr;
     entry.e_attrs_tail = &attr;
+    entry.e_tagged += is_tagged(attr) ? 1 : 0;
 }
 
 // Keeps the index true to a new record, or makes it where a walk was long. Without memory the entry goes on without.
@@ -166,6 +172,7 @@ void unlink_attribute(Entry& entry, Attribute& attr)
     (attr.a_sorted_next == nullptr ? entry.e_sorted_high : attr.a_sorted_next->a_sorted_prev) = attr.a_sorted_prev;
     (attr.a_prev == nullptr ? entry.e_attrs : attr.a_prev->a_next) = attr.a_next;
     (attr.a_next == nullptr ? entry.e_attrs_tail : attr.a_next->a_prev) = attr.a_prev;
+    entry.e_tagged -= is_tagged(attr) ? 1 : 0;
 }
 
 // The slot of a new record: a version without a tag takes it over from one with a tag.
@@ -199,6 +206,24 @@ int find_by_name(const Entry& entry, const char* name, const asyntaxinfo* info, 
     }
     *attr = too_long ? nullptr : flatattr_find(&entry, info, tag);
     return too_long ? LDAP_INVALID_SYNTAX : LDAP_SUCCESS;
+}
+
+// Puts what attr_find finds into *attr, and returns the attribute's first version in order of arrival. Both come from
+// one walk over the records, where a walk is needed.
+Attribute* find_by_name_or_tag(const Entry& entry, const char* name, const asyntaxinfo* info, Attribute** attr)
+{
+    const char* const tag = find_language_tag(name);
+    Attribute* const earliest = next_of(entry.e_attrs, info);
+    if (has_tag(tag) || earliest == nullptr || entry.e_index != nullptr ||
+        slot_of(const_cast<Entry&>(entry), info, false) != nullptr) {
+        find_by_name(entry, name, info, attr);
+        return earliest;
+    }
+    *attr = earliest;
+    while (*attr != nullptr && is_tagged(**attr)) {
+        *attr = next_of((*attr)->a_next, info);
+    }
+    return earliest;
 }
 
 // How a walk over versions has begun.
@@ -272,14 +297,13 @@ int attr_find_attr_or_lang_tag_version(const Entry* entry, const char* name, int
     if (*info == nullptr) {
         *info = ldcf_api_attr_get_info(name, nullptr);
     }
-    *attr = attr_find(entry, name, 0, *info);
+    Attribute* const earliest = find_by_name_or_tag(*entry, name, *info, attr);
     if (*attr == nullptr) {
         *tag_state = contains_valid_language_tag(name) ? 1 : 0;
-        *attr = *tag_state == 1 ? nullptr : next_of(entry->e_attrs, *info);
+        *attr = *tag_state == 1 ? nullptr : earliest;
     }
     if (*attr != nullptr) {
-        const bool in_order = is_tagged(**attr) || *attr == next_of(entry->e_attrs, *info);
-        *started = in_order ? walk_in_order : walk_untagged_first;
+        *started = is_tagged(**attr) || *attr == earliest ? walk_in_order : walk_untagged_first;
     }
     return 0;
 }
@@ -301,6 +325,8 @@ int attr_find_next_attr_match(const Entry* entry, const char* name, int* started
     if (*started == walk_not_started) {
         *started = walk_in_order;
         *attr = next_of(entry->e_attrs, info);
+    } else if (entry->e_tagged == 0) {
+        // The previous version was the one without a tag, and there are no others.
     } else if (*started == walk_in_order) {
         *attr = next_of(previous->a_next, info);
     } else {

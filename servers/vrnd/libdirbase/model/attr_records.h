@@ -13,6 +13,7 @@ struct named_attribute {
 
     Attribute attribute;
     std::size_t type_length;  // of the name, up to its first ":"
+    bool is_tagged;           // whether the name has a language tag
 
     char* name() { return reinterpret_cast<char*>(this + 1); }
 

@@ -45,7 +45,9 @@ struct Entry {
     std::int64_t e_member_count;
     std::int64_t e_uniquemember_count;
 
-    attr_index* e_index;  // the library's own: made once an entry has very many attributes, else null
+    // The library's own.
+    attr_index* e_index;    // made once an entry has very many attributes, else null
+    std::int32_t e_tagged;  // how many of the attributes have a language tag
 };
 
 extern "C" {
