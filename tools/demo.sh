@@ -1,6 +1,7 @@
 #!/bin/sh
 # Shows the main job on the data that ships: which entries of an LDIF file a server would take, and why it would refuse
-# the others; the forms of an entry; the changes between two files; and the schema and the DNs that all this rests on.
+# the others; the forms of an entry; the changes between two files; the schema and the DNs that all this rests on; and
+# what a search finds.
 #
 #   tools/demo.sh DIRBASE     DIRBASE is the path of the tool
 #
@@ -27,7 +28,14 @@ heading()
 # Shows a command as one would type it, and runs it.
 run()
 {
-    echo "\$ dirbase $*"
+    printf '$ dirbase'
+    for word; do
+        case $word in
+        *[!A-Za-z0-9_./:=,+-]*) printf " '%s'" "$word" ;;
+        *) printf ' %s' "$word" ;;
+        esac
+    done
+    echo
     "$dirbase" "$@"
 }
 
@@ -95,3 +103,17 @@ END
 cat names
 echo
 run_finding dn normalize --schema schema - <names
+
+cd "$root/share/sample"
+
+heading 'The first three who work in the glass house or the tower and have an account, but no photograph'
+run ldif search --limit 3 organisation.ldif \
+    '(&(objectClass=posixAccount)(|(ou=Glass House)(roomNumber=Tower *))(!(jpegPhoto=*)))' cn ou roomNumber
+
+heading 'How many people there are whose name has "ett" in it and ends in "th"'
+run ldif search --count --base 'OU = people, o=QUILLHAVEN WORKS' organisation.ldif '(sn=*ett*th)'
+
+heading 'An attribute that the schema lacks: left out of an OR, and the end of an AND'
+run ldif search organisation.ldif '(|(cn=Choir)(nickname=*))' cn 2>&1
+echo
+run_finding ldif search organisation.ldif '(&(cn=Choir)(!(nickname=*)))'

@@ -1,5 +1,4 @@
 // dirbase dn
-#include <algorithm>
 #include <memory>
 #include <new>
 
@@ -159,25 +158,6 @@ answer parent(const std::string& dn, bool light)
     return {false, text + "\n", {{"dn", dn}, {"ok", true}, {"parent", text}}};
 }
 
-// The DNs of a call, with those of standard input in the place of "-".
-std::vector<std::string> given_dns(const std::vector<std::string>& arguments)
-{
-    std::vector<std::string> dns;
-    for (const std::string& argument : arguments) {
-        if (argument != "-") {
-            dns.push_back(argument);
-            continue;
-        }
-        const std::string text = read_text(argument, text_source::any);
-        for (std::size_t begin = 0; begin < text.size();) {
-            const std::size_t end = std::min(text.find('\n', begin), text.size());
-            dns.push_back(text.substr(begin, end - begin));
-            begin = end + 1;
-        }
-    }
-    return dns;
-}
-
 // The schema that names are looked up in, unless it isn't wanted.
 void load_schema(const common_options& common, bool light)
 {
@@ -193,9 +173,12 @@ std::string result_words(int result)
     switch (result) {
     case LDAP_SUCCESS: return "0 success";
     case LDAP_OPERATIONS_ERROR: return "1 operationsError";
+    case LDAP_PROTOCOL_ERROR: return "2 protocolError";
+    case LDAP_CONFIDENTIALITY_REQUIRED: return "13 confidentialityRequired";
     case LDAP_UNDEFINED_TYPE: return "17 undefinedAttributeType";
     case LDAP_INVALID_SYNTAX: return "21 invalidAttributeSyntax";
     case LDAP_INVALID_DN_SYNTAX: return "34 invalidDNSyntax";
+    case LDAP_UNWILLING_TO_PERFORM: return "53 unwillingToPerform";
     case LDAP_OBJECT_CLASS_VIOLATION: return "65 objectClassViolation";
     case LDAP_OTHER: return "80 other";
     case LDAP_NO_MEMORY: return "90 no memory";
@@ -214,7 +197,7 @@ int ask_of_dns(const common_options& common, dn_question question, const std::ve
     bool refused = false;
     json members = json::array();
     std::string text;
-    for (const std::string& dn : given_dns(dns)) {
+    for (const std::string& dn : with_lines_of_input(dns)) {
         const answer given = question == dn_question::normalize ? normalize(dn, light)
                              : question == dn_question::parent  ? parent(dn, light)
                                                                 : check(dn);

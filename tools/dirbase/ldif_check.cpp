@@ -1,18 +1,14 @@
 // dirbase ldif check
 //
 // One thread reads batches of whole entries and prints what was found, in the order of the file; others check the
-// batches. What is held in memory is a few batches, however large the file is.
+// batches (ldif_pool.h).
 #include <algorithm>
 #include <cerrno>
-#include <condition_variable>
 #include <cstring>
-#include <deque>
-#include <exception>
-#include <mutex>
-#include <thread>
 #include <vector>
 
 #include "tools/dirbase/ldif_commands.h"
+#include "tools/dirbase/ldif_pool.h"
 #include "tools/dirbase/ldif_reader.h"
 #include "tools/dirbase/progress.h"
 #include "tools/dirbase/schema_directory.h"
@@ -43,8 +39,6 @@ struct work {
     std::string told;     // the faults, as lines or as items of a JSON array
     std::string rejects;  // the refused entries with their faults
     totals found;
-    std::exception_ptr failure;
-    bool done = false;
 };
 
 struct check_settings {
@@ -66,7 +60,7 @@ class batch_checker {
 public:
     explicit batch_checker(const check_settings& settings) : settings_(settings) {}
 
-    void check(work& item);
+    void operator()(work& item);
 
 private:
     void check_one(work& item, std::string_view entry, std::size_t line, std::uint64_t size);
@@ -77,7 +71,7 @@ private:
     ldif_fault_list faults_;
 };
 
-void batch_checker::check(work& item)
+void batch_checker::operator()(work& item)
 {
     item.told.clear();
     item.rejects.clear();
@@ -155,82 +149,6 @@ void batch_checker::tell(work& item, std::string_view entry, bool as_it_stood)
         item.rejects += "\n\n";
     }
 }
-
-// Threads that check what is handed to them.
-class check_pool {
-public:
-    check_pool(const check_settings& settings, unsigned threads)
-    {
-        for (unsigned i = 0; i < threads; ++i) {
-            threads_.emplace_back([this, &settings] { run(settings); });
-        }
-    }
-    ~check_pool()
-    {
-        {
-            const std::lock_guard<std::mutex> guard(mutex_);
-            stopping_ = true;
-            waiting_.clear();
-        }
-        more_.notify_all();
-        for (std::thread& thread : threads_) {
-            thread.join();
-        }
-    }
-    check_pool(const check_pool&) = delete;
-    check_pool& operator=(const check_pool&) = delete;
-
-    void hand_over(work& item)
-    {
-        {
-            const std::lock_guard<std::mutex> guard(mutex_);
-            item.done = false;
-            waiting_.push_back(&item);
-        }
-        more_.notify_one();
-    }
-
-    // Waits for an item that was handed over. Raises what checking it raised.
-    void wait_for(work& item)
-    {
-        std::unique_lock<std::mutex> guard(mutex_);
-        finished_.wait(guard, [&item] { return item.done; });
-        if (item.failure != nullptr) {
-            std::rethrow_exception(item.failure);
-        }
-    }
-
-private:
-    void run(const check_settings& settings)
-    {
-        batch_checker checker(settings);
-        std::unique_lock<std::mutex> guard(mutex_);
-        for (;;) {
-            more_.wait(guard, [this] { return stopping_ || !waiting_.empty(); });
-            if (stopping_) {
-                return;
-            }
-            work& item = *waiting_.front();
-            waiting_.pop_front();
-            guard.unlock();
-            try {
-                checker.check(item);
-            } catch (...) {
-                item.failure = std::current_exception();
-            }
-            guard.lock();
-            item.done = true;
-            finished_.notify_one();
-        }
-    }
-
-    std::mutex mutex_;
-    std::condition_variable more_;
-    std::condition_variable finished_;
-    std::deque<work*> waiting_;
-    bool stopping_ = false;
-    std::vector<std::thread> threads_;
-};
 
 // The file that takes the refused entries.
 class rejects_file {
@@ -372,39 +290,6 @@ void findings::finish(const tool_failure* failure)
     write_result((told_ ? "\n  ],\n" : "{\n  \"faults\": [],\n") + text.substr(2) + "\n");
 }
 
-void check_all(ldif_reader& reader, const check_settings& settings, unsigned threads, findings& out)
-{
-    if (threads == 1) {
-        batch_checker checker(settings);
-        for (work item; reader.next(item.batch);) {
-            checker.check(item);
-            out.take(item);
-        }
-        return;
-    }
-    std::deque<work> ring(2 * threads + 1);
-    check_pool pool(settings, threads);
-    std::size_t read = 0;
-    std::size_t taken = 0;
-    for (bool more = true;;) {
-        while (more && read - taken < ring.size()) {
-            work& item = ring[read % ring.size()];
-            more = reader.next(item.batch);
-            if (more) {
-                pool.hand_over(item);
-                ++read;
-            }
-        }
-        if (taken == read) {
-            return;
-        }
-        work& oldest = ring[taken % ring.size()];
-        pool.wait_for(oldest);
-        out.take(oldest);
-        ++taken;
-    }
-}
-
 }  // namespace
 
 void load_for_entries(const common_options& common)
@@ -416,13 +301,17 @@ void load_for_entries(const common_options& common)
 int check_ldif(const common_options& common, const ldif_check_call& call)
 {
     load_for_entries(common);
-    const unsigned processors = std::clamp(std::thread::hardware_concurrency(), 1u, ldif_most_threads);
     const check_settings settings = {call.checks, source_name(call.file), common.as_json, !call.rejects.empty()};
     ldif_reader reader(call.file, settings.with_rejects);
     rejects_file rejects(call.rejects, reader);
     findings out(settings, reader, rejects);
     try {
-        check_all(reader, settings, call.threads == 0 ? processors : call.threads, out);
+        for_each_batch<work>(
+            reader, ldif_threads(call.threads), [&settings] { return batch_checker(settings); },
+            [&out](const work& item) {
+                out.take(item);
+                return true;
+            });
         rejects.close();
     } catch (const tool_failure& failure) {
         if (!common.as_json) {

@@ -3,7 +3,6 @@
 // Both files are held as entries, found by their normal DN. The changes come in an order in which a server takes them:
 // entries that go, leaves first; entries that change; entries that come, parents first.
 #include <algorithm>
-#include <cstring>
 #include <new>
 #include <unordered_map>
 #include <unordered_set>
@@ -11,7 +10,6 @@
 #include <strings.h>
 
 #include "libraries/libber/ldap_result.h"
-#include "libraries/libldif/line64.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
 #include "servers/vrnd/libdirbase/model/attr_value_tree.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
@@ -28,15 +26,6 @@ namespace {
 std::string_view bytes_of(const berval& value)
 {
     return {value.bv_val, value.bv_len};
-}
-
-void append_line(std::string& text, const char* type, std::string_view value)
-{
-    const std::size_t old_size = text.size();
-    text.resize(old_size + ldif_line_room(std::strlen(type), value.size()));
-    char* end = text.data() + old_size;
-    put_type_and_value(&end, type, value.data(), value.size());
-    text.resize(static_cast<std::size_t>(end - text.data()));
 }
 
 // The entries of one file, in its order.
@@ -185,9 +174,9 @@ std::vector<const berval*> all_values(const Attribute& attribute)
 void append_modification(std::string& text, const char* operation, const Attribute& attribute,
                          const std::vector<const berval*>& values)
 {
-    append_line(text, operation, attribute.a_type);
+    append_ldif_line(text, operation, attribute.a_type);
     for (const berval* value : values) {
-        append_line(text, attribute.a_type, bytes_of(*value));
+        append_ldif_line(text, attribute.a_type, bytes_of(*value));
     }
     text += "-\n";
 }
@@ -241,7 +230,7 @@ std::string all_lines(const Entry& entry, attribute_rules& rules)
     for (const Attribute* attribute = entry.e_attrs; attribute != nullptr; attribute = attribute->a_next) {
         if (rules.of(attribute->a_info).modifiable) {
             for (const berval* value : all_values(*attribute)) {
-                append_line(text, attribute->a_type, bytes_of(*value));
+                append_ldif_line(text, attribute->a_type, bytes_of(*value));
             }
         }
     }
@@ -286,8 +275,8 @@ private:
 void change_writer::write(const Entry& entry, const char* type, const std::string& body)
 {
     std::string text;
-    append_line(text, "dn", entry.e_dn);
-    append_line(text, "changetype", type);
+    append_ldif_line(text, "dn", entry.e_dn);
+    append_ldif_line(text, "changetype", type);
     text += body;
     if (as_json_) {
         const json change = {{"dn", entry.e_dn}, {"changetype", type}, {"ldif", text}};

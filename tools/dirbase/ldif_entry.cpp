@@ -58,39 +58,6 @@ const char* words_of_syntax(std::uint32_t syntax)
     }
 }
 
-// The entry with its DN and normal DN; without the latter, and with a fault, when the DN is refused.
-entry_pointer new_entry(const ldif_text& text, ldif_fault_list& faults)
-{
-    Entry* made = nullptr;
-    not_without_memory(CreateEntry(&made));
-    entry_pointer entry(made);
-    const ldif_line* const dn = text.dn();
-    if (dn == nullptr || dn->spoilt) {
-        return entry;
-    }
-    if (std::memchr(dn->value, '\0', dn->length) != nullptr) {
-        faults.add(kind::nul_byte, dn->line, "dn", "the DN holds a byte 0");
-        return entry;
-    }
-    if (value_of(*dn).find_first_not_of(" ") == std::string_view::npos) {
-        faults.add(kind::bad_dn, dn->line, "dn", "the empty DN, which is no entry's");
-        return entry;
-    }
-    entry->e_dn = strdup(dn->value);
-    ldap_escDN* normal = entry->e_dn == nullptr ? nullptr : dn_normalize_esc(entry->e_dn);
-    if (normal == nullptr) {
-        throw std::bad_alloc();
-    }
-    if (not_without_memory(normal->result) == LDAP_SUCCESS) {
-        entry->e_norm_dn = std::exchange(normal->upper, nullptr);
-    }
-    free_ldap_escDN(&normal);
-    if (entry->e_norm_dn == nullptr) {
-        faults.add(kind::bad_dn, dn->line, "dn", refusal_of_dn(dn->value));
-    }
-    return entry;
-}
-
 // Adds the values of an entry one after the other, and says what an addition would have against them.
 class value_check {
 public:
@@ -412,37 +379,72 @@ void schema_check::report(const ldcf_entry_finding& finding)
 
 }  // namespace
 
-entry_pointer make_entry(ldif_text& text, bool complete, ldif_fault_list& faults)
+entry_pointer new_entry(const ldif_text& text, ldif_fault_list& faults)
 {
-    entry_pointer entry = new_entry(text, faults);
-    if (entry->e_norm_dn == nullptr) {
-        return nullptr;
+    Entry* made = nullptr;
+    not_without_memory(CreateEntry(&made));
+    entry_pointer entry(made);
+    const ldif_line* const dn = text.dn();
+    if (dn == nullptr || dn->spoilt) {
+        return entry;
     }
+    if (std::memchr(dn->value, '\0', dn->length) != nullptr) {
+        faults.add(kind::nul_byte, dn->line, "dn", "the DN holds a byte 0");
+        return entry;
+    }
+    if (value_of(*dn).find_first_not_of(" ") == std::string_view::npos) {
+        faults.add(kind::bad_dn, dn->line, "dn", "the empty DN, which is no entry's");
+        return entry;
+    }
+    entry->e_dn = strdup(dn->value);
+    ldap_escDN* normal = entry->e_dn == nullptr ? nullptr : dn_normalize_esc(entry->e_dn);
+    if (normal == nullptr) {
+        throw std::bad_alloc();
+    }
+    if (not_without_memory(normal->result) == LDAP_SUCCESS) {
+        entry->e_norm_dn = std::exchange(normal->upper, nullptr);
+    }
+    free_ldap_escDN(&normal);
+    if (entry->e_norm_dn == nullptr) {
+        faults.add(kind::bad_dn, dn->line, "dn", refusal_of_dn(dn->value));
+    }
+    return entry;
+}
+
+bool add_values(Entry& entry, ldif_text& text, bool complete, ldif_fault_list& faults)
+{
+    const bool may_be_too_many = text.lines().size() > attribute_limit;
     std::unordered_set<std::string_view> types;
     for (ldif_line& line : text.lines()) {
-        if (types.insert(line.type).second && types.size() > attribute_limit) {
+        if (may_be_too_many && types.insert(line.type).second && types.size() > attribute_limit) {
             faults.add(kind::too_large, text.line(), "",
                        "more than " + std::to_string(attribute_limit) + " attributes");
-            return nullptr;
+            return false;
         }
         berval value = {line.length, line.value};
         berval* values[] = {&value, nullptr};
         int result = complete ? LDAP_OTHER : LDAP_SUCCESS;
         if (complete) {
-            result = not_without_memory(attr_merge(entry.get(), line.type, values, 1, 1, nullptr));
+            result = not_without_memory(attr_merge(&entry, line.type, values, 1, 1, nullptr));
         }
         // A value that its syntax refuses is taken as it is.
         if (!complete || result != LDAP_SUCCESS) {
-            result = not_without_memory(attr_merge(entry.get(), line.type, values, 0, 0, nullptr));
+            result = not_without_memory(attr_merge(&entry, line.type, values, 0, 0, nullptr));
         }
         if (result != LDAP_SUCCESS) {
             faults.add(kind::bad_option, line.line, line.type, result_words(result));
         }
     }
     if (complete) {
-        not_without_memory(expand_rdn_esc(entry.get()));
+        not_without_memory(expand_rdn_esc(&entry));
     }
-    return faults.empty() ? std::move(entry) : nullptr;
+    return faults.empty();
+}
+
+entry_pointer make_entry(ldif_text& text, bool complete, ldif_fault_list& faults)
+{
+    entry_pointer entry = new_entry(text, faults);
+    return entry->e_norm_dn != nullptr && add_values(*entry, text, complete, faults) ? std::move(entry) : nullptr;
 }
 
 void check_entry(ldif_text& text, const check_options& options, ldif_fault_list& faults)

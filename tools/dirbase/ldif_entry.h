@@ -30,11 +30,17 @@ public:
 // so that the time for an entry grows with the square of their number.
 constexpr std::size_t attribute_limit = 10'000;
 
-// Makes the entry of a text, values as they are given and in their order; null, with a fault, when the DN is refused
-// or there are too many attributes. A name or an option that the schema doesn't know is kept.
+// Makes an entry with its DN and normal DN alone; without the latter, and with a fault, when the DN is refused.
+entry_pointer new_entry(const ldif_text& text, ldif_fault_list& faults);
+
+// Adds the values of a text to its entry, as they are given and in their order. False, with a fault, when there are too
+// many attributes, and when `faults` had one before. A name or an option that the schema doesn't know is kept.
 //
 //   complete  whether the naming attributes are added, as a server does, and values that an attribute has already are
 //             dropped
+bool add_values(Entry& entry, ldif_text& text, bool complete, ldif_fault_list& faults);
+
+// Both: the entry of a text, or null with a fault.
 entry_pointer make_entry(ldif_text& text, bool complete, ldif_fault_list& faults);
 
 struct check_options {

@@ -2,6 +2,7 @@
 #include "tools/dirbase/ldif_reader.h"
 
 #include <fcntl.h>
+#include <poll.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -106,6 +107,12 @@ bool ldif_reader::read_more(std::string& text)
     bytes_read_ += static_cast<std::uint64_t>(got);
     at_end_ = got == 0;
     return !at_end_;
+}
+
+bool ldif_reader::is_ready() const
+{
+    pollfd input = {handle_, POLLIN, 0};
+    return ::poll(&input, 1, 0) != 0;  // the end, and a failure, are there to be read too
 }
 
 bool ldif_reader::next(ldif_batch& batch)

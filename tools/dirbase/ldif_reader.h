@@ -42,6 +42,9 @@ public:
     // Reads the next batch; false at the end. The room of the batch is used again.
     bool next(ldif_batch& batch);
 
+    // Whether there is something to read, so that next() begins without waiting for who writes it.
+    bool is_ready() const;
+
     // How far it is: the bytes read, and those of the file, 0 when nobody knows.
     std::uint64_t bytes_read() const { return bytes_read_; }
     std::uint64_t bytes_in_all() const { return bytes_in_all_; }

@@ -266,4 +266,13 @@ bool ldif_text::is_about_text(const ldif_line& line, ldif_fault_list& faults)
     return true;
 }
 
+void append_ldif_line(std::string& text, const char* type, std::string_view value)
+{
+    const std::size_t old_size = text.size();
+    text.resize(old_size + ldif_line_room(std::strlen(type), value.size()));
+    char* end = text.data() + old_size;
+    put_type_and_value(&end, type, value.data(), value.size());
+    text.resize(static_cast<std::size_t>(end - text.data()));
+}
+
 }  // namespace dirbase_tool

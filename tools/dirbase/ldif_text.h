@@ -60,4 +60,7 @@ private:
     std::size_t line_ = 0;
 };
 
+// Adds a line of LDIF to a text, folded, the value in Base64 where it has to be.
+void append_ldif_line(std::string& text, const char* type, std::string_view value);
+
 }  // namespace dirbase_tool

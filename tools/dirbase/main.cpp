@@ -1,20 +1,13 @@
 // The command line of `dirbase`: groups, commands, options, and what becomes of a failure.
-#include <CLI/CLI.hpp>
-#include <functional>
 #include <new>
 #include <sstream>
 
+#include "tools/dirbase/command_line.h"
 #include "tools/dirbase/data_commands.h"
-#include "tools/dirbase/ldif_commands.h"
 
 namespace dirbase_tool {
 
 namespace {
-
-// Help is wrapped by hand, since the parser's library doesn't wrap.
-constexpr char exit_statuses[] = R"(
-Exit status: 0 for yes, 1 for findings (the message says what, and where), 2 for a wrong call or input that
-can't be read.)";
 
 constexpr char check_details[] =
     R"(A syntax error is told as FILE:LINE: TEXT, a fault between definitions as TEXT. What a server would only
@@ -61,39 +54,6 @@ constexpr char value_details[] =
 has its answer, in their order.
 )";
 
-constexpr char ldif_check_details[] =
-    R"(Each entry is checked as an addition would: the lines, the DN, the names of the attributes, the values by
-their syntax, and the whole against the schema. A fault is told as FILE:LINE: DN: ATTRIBUTE OR CLASS: REASON;
-the last lines count the faults by kind (docs/ldif.md explains them all). Naming attributes that an entry
-lacks are no fault: a server adds them.
-
-Modes of the schema check:
-  1  each object class by itself, without what it inherits
-  2  one structural object class and all its superiors, but for top (default)
-  3  any number of structural object classes; superiors may be missing
-  4  no schema check
-
-An entry of more than 16 MiB, or with more than 10,000 attributes, is told and not looked at any further; the
-others are. Memory doesn't grow with the file.
-)";
-
-constexpr char ldif_print_details[] =
-    R"(Entries are parted by an empty line. An entry with lines that can't be read, or a bad DN, is told and left
-out. Nothing else is checked.
-
-Forms:
-  ldif        all attributes, a line for each value (default)
-  no-members  the same with one line CN=NULL in the place of all values of member and of uniqueMember
-  ber         the encoding in which the entry goes to clients, in hexadecimal
-)";
-
-constexpr char ldif_diff_details[] =
-    R"(Entries are the same when their DNs are in normal form, and values when their syntax says so. The changes
-come in an order in which a server takes them: entries that go, leaves first; entries that change; new
-entries, parents first. Attributes that only the server sets are left out. Exit status 1 says that there are
-differences. Both files are held in memory.
-)";
-
 struct options {
     common_options common;
     std::vector<std::string> files;
@@ -108,14 +68,7 @@ struct options {
     bool light = false;
     std::string operation;
     std::string definition_file;
-    ldif_check_call ldif_check;
-    std::string file;
-};
-
-template <typename Value>
-struct word {
-    const char* text;
-    Value value;
+    entry_options entries;
 };
 
 constexpr word<print_form> forms[] = {
@@ -131,74 +84,6 @@ constexpr word<print_kind> kinds[] = {
     {"attributetypes", print_kind::attribute_types},
     {"objectclasses", print_kind::object_classes},
 };
-
-constexpr word<ldif_form> ldif_forms[] = {
-    {"ldif", ldif_form::text},
-    {"no-members", ldif_form::without_members},
-    {"ber", ldif_form::ber},
-};
-
-// Accepts the words of a table, in any case.
-template <typename Value, std::size_t count>
-CLI::IsMember one_of(const word<Value> (&words)[count])
-{
-    std::vector<std::string> texts;
-    for (const word<Value>& candidate : words) {
-        texts.emplace_back(candidate.text);
-    }
-    return CLI::IsMember(texts, CLI::ignore_case);
-}
-
-template <typename Value, std::size_t count>
-Value value_of(const std::string& text, const word<Value> (&words)[count], Value otherwise)
-{
-    for (const word<Value>& candidate : words) {
-        if (text == candidate.text) {
-            return candidate.value;
-        }
-    }
-    return otherwise;
-}
-
-using command = std::function<int(message_collector&)>;
-
-void add_flags_of_all(CLI::App& app)
-{
-    app.set_version_flag("--version", "dirbase " DIRBASE_VERSION, "Print the version and exit");
-    app.set_help_flag("-h,--help", "Print this help and exit");
-}
-
-// A word that is followed by another. That one comes is looked at later: the parser would tell a wrong word as a
-// missing one.
-void expect_subcommand(CLI::App& app)
-{
-    app.require_subcommand(0, 1);
-}
-
-CLI::App* add_bare_command(CLI::App& group, const std::string& name, const std::string& description,
-                           const std::string& details, common_options& common)
-{
-    CLI::App* app = group.add_subcommand(name, description);
-    add_flags_of_all(*app);
-    app->footer(details + exit_statuses);
-    app->add_flag("--json", common.as_json,
-                  "Write the result as JSON; a failure is an object too, with \"ok\": false and \"error\"");
-    app->add_flag("-v,--verbose", common.verbosity,
-                  "Show the message log on standard error; given twice, the debug log too");
-    return app;
-}
-
-// A command that works on one schema directory.
-CLI::App* add_command(CLI::App& group, const std::string& name, const std::string& description,
-                      const std::string& details, common_options& common)
-{
-    CLI::App* app = add_bare_command(group, name, description, details, common);
-    app->add_option("--schema", common.schema_folder,
-                    "Directory of schema.list and the files that it names (default: that of\n"
-                    "the environment variable DIRBASE_SCHEMA, else the one that came along)")
-        ->type_name("DIR");
-    return app;
-}
 
 void add_check(CLI::App& group, options& given, command& chosen)
 {
@@ -337,57 +222,6 @@ void add_value_group(CLI::App& app, options& given, command& chosen)
     });
 }
 
-void add_ldif_check(CLI::App& group, options& given, command& chosen)
-{
-    ldif_check_call& call = given.ldif_check;
-    CLI::App* app = add_command(group, "check", "Tell which entries a server would refuse, and why", ldif_check_details,
-                                given.common);
-    app->add_option("FILE", call.file, "The LDIF file, - for standard input")->type_name("")->required();
-    app->add_option("--mode", call.checks.mode, "How strictly entries are checked against the schema")
-        ->check(CLI::Range(1, 4).description(""))
-        ->type_name("1|2|3|4");
-    app->add_flag("--policy", call.checks.policy,
-                  "Permit the attributes of the password policy and those that servers set,\nas in a copy of another "
-                  "server");
-    app->add_option("--rejects", call.rejects, "Write the refused entries, as they stood, to this file")
-        ->type_name("FILE");
-    app->add_option("--threads", call.threads,
-                    "How many threads check (default: one a processor, at most " + std::to_string(ldif_most_threads) +
-                        ")")
-        ->check(CLI::Range(1, 64).description(""))
-        ->type_name("N");
-    app->callback([&] { chosen = [&](message_collector&) { return check_ldif(given.common, given.ldif_check); }; });
-}
-
-void add_ldif_group(CLI::App& app, options& given, command& chosen)
-{
-    CLI::App* group = app.add_subcommand("ldif", "Check, print and compare entries in LDIF files");
-    add_flags_of_all(*group);
-    expect_subcommand(*group);
-    add_ldif_check(*group, given, chosen);
-
-    CLI::App* print =
-        add_command(*group, "print", "Print entries as the server writes them", ldif_print_details, given.common);
-    print->add_option("FILE", given.file, "The LDIF file, - for standard input")->type_name("")->required();
-    print->add_option("--form", given.form, "How to print each entry")
-        ->transform(one_of(ldif_forms))
-        ->type_name("FORM");
-    print->callback([&] {
-        chosen = [&](message_collector&) {
-            return print_ldif(given.common, given.file, value_of(given.form, ldif_forms, ldif_form::text));
-        };
-    });
-
-    CLI::App* diff = add_command(*group, "diff", "Print the changes that turn one LDIF file into another",
-                                 ldif_diff_details, given.common);
-    diff->add_option("BEFORE", given.before, "The file to compare with, - for standard input")
-        ->type_name("")
-        ->required();
-    diff->add_option("AFTER", given.after, "The file that may differ, - for standard input")->type_name("")->required();
-    diff->callback(
-        [&] { chosen = [&](message_collector&) { return diff_ldif(given.common, given.before, given.after); }; });
-}
-
 // Tells a failure, to the eyes and with --json to programs, and gives its exit status.
 int report(const tool_failure& failure, bool as_json)
 {
@@ -458,7 +292,8 @@ int main_of_tool(int argc, char** argv)
     add_modify(*schema, given, chosen);
     add_dn_group(app, given, chosen);
     add_value_group(app, given, chosen);
-    add_ldif_group(app, given, chosen);
+    add_filter_group(app, given.common, given.entries, chosen);
+    add_ldif_group(app, given.common, given.entries, chosen);
 
     try {
         app.parse(argc, argv);

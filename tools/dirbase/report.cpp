@@ -6,6 +6,7 @@
 #include <cstring>
 #include <new>
 
+#include "libraries/libldif/line64.h"
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libmsg/message_format.h"
 
@@ -15,6 +16,7 @@ namespace {
 
 // Far beyond every honest message; names in a hostile schema have no limit.
 constexpr std::size_t message_limit = 16384;
+constexpr std::size_t longest_shown_value = 80;
 
 bool from_operating_system(const exc_t& exception)
 {
@@ -55,6 +57,55 @@ std::string on_one_line(std::string_view text)
         escaped += "... (" + std::to_string(text.size()) + " bytes)";
     }
     return escaped;
+}
+
+std::string shortened(std::string_view value)
+{
+    if (value.size() <= longest_shown_value) {
+        return on_one_line(value);
+    }
+    std::size_t end = longest_shown_value;
+    while (end > longest_shown_value - 4 && (static_cast<unsigned char>(value[end]) & 0xC0) == 0x80) {
+        --end;  // not inside a character
+    }
+    return on_one_line(value.substr(0, end)) + "... (" + std::to_string(value.size()) + " bytes)";
+}
+
+bool is_utf8(std::string_view bytes)
+{
+    for (std::size_t at = 0; at < bytes.size();) {
+        const auto first = static_cast<unsigned char>(bytes[at]);
+        const std::size_t length = first < 0x80 ? 1 : first < 0xC2 ? 0 : first < 0xE0 ? 2 : first < 0xF0 ? 3 : 4;
+        if (length == 0 || first > 0xF4 || length > bytes.size() - at) {
+            return false;
+        }
+        char32_t character = first & (0xFFu >> (length == 1 ? 0 : length + 1));
+        for (std::size_t i = 1; i < length; ++i) {
+            const auto next = static_cast<unsigned char>(bytes[at + i]);
+            if ((next & 0xC0) != 0x80) {
+                return false;
+            }
+            character = character << 6 | (next & 0x3Fu);
+        }
+        const bool is_overlong = (length == 3 && character < 0x800) || (length == 4 && character < 0x10000);
+        if (is_overlong || (character >= 0xD800 && character <= 0xDFFF) || character > 0x10FFFF) {
+            return false;
+        }
+        at += length;
+    }
+    return true;
+}
+
+json json_of_value(std::string_view value)
+{
+    if (is_utf8(value)) {
+        return value;
+    }
+    std::string text(4 * (value.size() + 2) / 3 + 4, '\0');
+    char* end = text.data();
+    base64encode(&end, value.data(), value.data() + value.size(), -1);
+    text.resize(static_cast<std::size_t>(end - text.data()));
+    return {{"base64", std::move(text)}};
 }
 
 void tell(std::string_view line)

@@ -64,6 +64,15 @@ inline std::string text_of(const csgl_string& text)
 // A text with its control bytes escaped, cut when it is longer than anybody reads.
 std::string on_one_line(std::string_view text);
 
+// The same for a value in the midst of other words, of which the beginning is enough.
+std::string shortened(std::string_view value);
+
+// Whether bytes are well-formed UTF-8.
+bool is_utf8(std::string_view bytes);
+
+// A value as JSON: a text, or for bytes that are none {"base64": TEXT}.
+json json_of_value(std::string_view value);
+
 // Writes a line to standard error, made safe by on_one_line.
 void tell(std::string_view line);
 

@@ -99,4 +99,22 @@ std::string read_text(const std::string& path, text_source allowed)
     }
 }
 
+std::vector<std::string> with_lines_of_input(const std::vector<std::string>& arguments)
+{
+    std::vector<std::string> texts;
+    for (const std::string& argument : arguments) {
+        if (argument != standard_input) {
+            texts.push_back(argument);
+            continue;
+        }
+        const std::string text = read_text(argument, text_source::any);
+        for (std::size_t begin = 0; begin < text.size();) {
+            const std::size_t end = std::min(text.find('\n', begin), text.size());
+            texts.push_back(text.substr(begin, end - begin));
+            begin = end + 1;
+        }
+    }
+    return texts;
+}
+
 }  // namespace dirbase_tool

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <string>
+#include <vector>
 
 namespace dirbase_tool {
 
@@ -20,5 +21,8 @@ enum class text_source {
 // The whole content of a file. Raises tool_failure with status_unusable for what can't be opened or read, a folder, a
 // file with a byte 0 in it (schema text is ended by one, so the rest would be lost in silence), and one beyond 1 GiB.
 std::string read_text(const std::string& path, text_source allowed);
+
+// The arguments of a call, with the lines of standard input in the place of each "-".
+std::vector<std::string> with_lines_of_input(const std::vector<std::string>& arguments);
 
 }  // namespace dirbase_tool

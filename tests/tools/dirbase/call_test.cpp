@@ -38,6 +38,9 @@ TEST(ToolCall, HelpAndVersionAreEverywhere)
         {"ldif", "check"},
         {"ldif", "print"},
         {"ldif", "diff"},
+        {"ldif", "search"},
+        {"filter"},
+        {"filter", "parse"},
     };
     for (words call : calls) {
         SCOPED_TRACE(testing::PrintToString(call));
