@@ -13,6 +13,7 @@
 
 #include "servers/vrnd/libdirbase/base/backend.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_api.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_schema_recover.h"
 #include "tools/dirbase/report.h"
 #include "tools/dirbase/text_file.h"
 
@@ -85,8 +86,9 @@ schema_directory::schema_directory(const std::string& folder, purpose why)
     : folder_(find_folder(folder)), list_((fs::path(folder_) / list_name).string())
 {
     announce_relational_store();
-    lock(why);
+    const bool locked = lock(why);
     read_list();
+    recover(why, locked);
 }
 
 schema_directory::~schema_directory()
@@ -97,14 +99,23 @@ schema_directory::~schema_directory()
 }
 
 // The lock is on schema.list, which no change replaces. Only a change depends on it: what reads a folder on a file
-// system without locks may at worst meet a file that is missing for a moment.
-void schema_directory::lock(purpose why)
+// system without locks may at worst meet a file that is missing for a moment. Returns whether there is a lock.
+bool schema_directory::lock(purpose why)
 {
     lock_handle_ = ::open(list_.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK);
     if (lock_handle_ < 0) {
         throw tool_failure(status_unusable, list_, 0, std::strerror(errno));
     }
-    const int kind = why == purpose::change ? LOCK_EX : LOCK_SH;
+    const int failure = take_lock(why == purpose::change ? LOCK_EX : LOCK_SH);
+    if (failure != 0 && why == purpose::change) {
+        throw tool_failure(status_findings, list_, 0, std::string("can't be locked: ") + std::strerror(failure));
+    }
+    return failure == 0;
+}
+
+// Takes the lock, or exchanges the one that is held, and returns 0 or the errno.
+int schema_directory::take_lock(int kind)
+{
     int failed = ::flock(lock_handle_, kind | LOCK_NB);
     if (failed != 0 && errno == EWOULDBLOCK) {
         tell("waiting for another run that has " + list_ + " locked");
@@ -112,8 +123,52 @@ void schema_directory::lock(purpose why)
             failed = ::flock(lock_handle_, kind);
         } while (failed != 0 && errno == EINTR);
     }
-    if (failed != 0 && why == purpose::change) {
-        throw tool_failure(status_findings, list_, 0, std::string("can't be locked: ") + std::strerror(errno));
+    return failed == 0 ? 0 : errno;
+}
+
+// Temporary files alone are no reader's business: the schema files are whole, and the next change removes them.
+//
+// A reader that has to move files takes the folder for itself, for the rest of its run. Others may come first, so it
+// looks again. Without a lock it can't know that the change isn't just running, and moves nothing.
+void schema_directory::recover(purpose why, bool locked)
+{
+    csgl_vector<csgl_string> paths;
+    for (const listed_file& file : files_) {
+        paths.emplace_back(file.path.c_str());
+    }
+    const bool only_reads = why == purpose::read;
+    ldcf_recovery leftovers(paths);
+    if (leftovers.found() == ldcf_leftovers::none || (only_reads && leftovers.found() == ldcf_leftovers::unused)) {
+        return;
+    }
+    std::string refusal;
+    if (only_reads) {
+        locked = locked && take_lock(LOCK_EX) == 0;
+        refusal = locked ? "" : "it can't be locked";
+        leftovers = ldcf_recovery(paths);
+    }
+    const std::string what = leftovers.text();
+    std::string where;
+    for (const csgl_string& file : leftovers.concerned()) {
+        where += (where.empty() ? " (" : ", ") + name_of(text_of(file));
+    }
+    if (refusal.empty()) {
+        try {
+            leftovers.run();
+        } catch (const exc_t& failure) {
+            if (!only_reads) {
+                throw failure_of(failure, folder_);
+            }
+            refusal = text_of(failure.message().text());
+            leftovers = ldcf_recovery(paths);  // some of the steps may have been taken
+        }
+    }
+    for (listed_file& file : files_) {
+        file.source = text_of(leftovers.source_of(file.path.c_str()));
+    }
+    if (!where.empty()) {
+        tell(folder_ + ": " + what + where + ")" +
+             (refusal.empty() ? "" : "; the folder is left as it is, since " + refusal));
     }
 }
 
@@ -126,7 +181,8 @@ void schema_directory::read_list()
         const std::string_view line = without_blanks(rest.substr(0, end));
         rest.remove_prefix(end == std::string_view::npos ? rest.size() : end + 1);
         if (!line.empty() && line.front() != '#') {
-            files_.push_back({std::string(line), (fs::path(folder_) / line).string()});
+            const std::string path = (fs::path(folder_) / line).string();
+            files_.push_back({std::string(line), path, path});
         }
     }
     if (files_.empty()) {
@@ -148,7 +204,7 @@ void schema_directory::load(const std::vector<std::string>& more) const
 {
     ldcf_schema& schema = *ldcf_schema_g;
     for (const listed_file& file : files_) {
-        parse_schema_text(schema, read_text(file.path, text_source::regular_file), file.path, file.path);
+        parse_schema_text(schema, read_text(file.source, text_source::regular_file), file.path, file.source);
     }
     for (const std::string& path : more) {
         parse_schema_text(schema, read_text(path, text_source::any), source_name(path), source_name(path));

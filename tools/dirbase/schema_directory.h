@@ -2,6 +2,9 @@
 //
 // schema.list names the files in their loading order, a name a line, relative to the folder. Lines that are blank or
 // begin with # don't count. The last file takes the definitions that are added.
+//
+// A change that was interrupted is taken back or carried to its end before anything is loaded, and the user told
+// (ldcf_schema_recover.h). Who may not write to the folder reads the same schema from where it stands.
 #pragma once
 
 #include <functional>
@@ -19,7 +22,8 @@ public:
     // What the folder is opened for. Runs that change one folder take turns, and runs that read it wait for them.
     enum class purpose { read, change };
 
-    // Finds the folder, locks it and reads its list.
+    // Finds the folder, locks it, reads its list and recovers what an interrupted change has left. A purpose of change
+    // fails when that can't be done.
     //
     //   folder  the folder that the command line names; empty for the one in the environment variable DIRBASE_SCHEMA,
     //           or without that the schema that came with the tool
@@ -43,11 +47,14 @@ public:
 private:
     struct listed_file {
         std::string name;
-        std::string path;
+        std::string path;    // under which it is loaded
+        std::string source;  // where its text stands: the path, unless a change was interrupted and can't be recovered
     };
 
-    void lock(purpose why);
+    bool lock(purpose why);
+    int take_lock(int kind);
     void read_list();
+    void recover(purpose why, bool locked);
 
     std::string folder_;
     std::string list_;

@@ -90,11 +90,14 @@ public:
     void flush(const csgl_string& file) const;
 
     // Put the temporary files in the place of the modified files. When one can't be, those already replaced are put
-    // back and the failure is raised; all stay marked modified.
+    // back and the failure is raised; all stay marked modified. What a killed process leaves of this is told in
+    // ldcf_schema_recover.h.
     void flush_commit();
 
     // Removes the temporary files of the modified files, which count as flushed then. A missing one is passed over; of
-    // other failures the first is raised when all are done.
+    // other failures the first is raised when all are done. Where a failed commit could not put a file back, and it
+    // can't be now, the temporary files stay: without them the next start would take the commit for one that was
+    // through.
     void flush_rollback();
 
     // Unlinks and drops all definitions and forgets all files.

@@ -7,13 +7,9 @@
 #include "libraries/libmsg/debug_log.h"
 #include "servers/vrnd/libcsgl/csgl_file.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_schema_recover.h"
 
 namespace {
-
-csgl_string temporary_of(const csgl_string& file)
-{
-    return file + file_suffix;
-}
 
 // Writes one section: the text of each definition that is at home in a file, a line each.
 template <typename Map, typename Text, typename AtHome>
@@ -40,13 +36,16 @@ void remove_if_there(const csgl_string& file)
 // The old content of one schema file, kept under a second name while the new content takes its place. Unless the change
 // is kept, the destructor puts it back. The second name is built on that of the temporary file, which is the server's
 // own, so that no copy of the administrator's is in its way.
+//
+// Which of these names stand when the process is killed says what is to be loaded afterwards (ldcf_schema_recover.h):
+// no backup goes before the last temporary file has gone into its place.
 class replaced_file {
 public:
-    explicit replaced_file(const csgl_string& file) : file_(file), backup_(temporary_of(file) + ".old")
+    explicit replaced_file(const csgl_string& file) : file_(file), backup_(ldcf_backup_of(file))
     {
         remove_if_there(backup_);
-        existed_ = csgl_file::exists(file_);
-        if (existed_ && ::link(file_, backup_) != 0) {
+        existed_ = ::link(file_, backup_) == 0;
+        if (!existed_ && errno != ENOENT) {
             exc_t::throw_posix_error(__FILE__, __LINE__, errno);
         }
     }
@@ -68,7 +67,7 @@ public:
         }
     }
 
-    void take_new_content() { csgl_file::rename(temporary_of(file_), file_, csgl_file_force); }
+    void take_new_content() { csgl_file::rename(ldcf_temporary_of(file_), file_, csgl_file_force); }
 
     // The new content stays.
     void keep() noexcept
@@ -99,7 +98,7 @@ void ldcf_schema::flush() const
 
 void ldcf_schema::flush(const csgl_string& file) const
 {
-    csgl_output_file output(temporary_of(file), csgl_output_truncate);
+    csgl_output_file output(ldcf_temporary_of(file), csgl_output_truncate);
     const auto standard = [](const auto& definition) { return definition.v3_string().c_str(); };
     const auto at_home = [&](const auto& definition) { return definition->v3_file() == file; };
 
@@ -119,6 +118,16 @@ void ldcf_schema::flush(const csgl_string& file) const
 
 void ldcf_schema::flush_commit()
 {
+    // A temporary file that an earlier change could not remove would make this commit look as if it were not through.
+    csgl_vector<csgl_string> others;
+    for (const auto& [file, state] : files) {
+        if (state == modified_indicator::flushed) {
+            others.push_back(file);
+        }
+    }
+    if (ldcf_recovery leftovers(others); leftovers.found() == ldcf_leftovers::unused) {
+        leftovers.run();
+    }
     csgl_vector<replaced_file> replaced;
     for (const auto& [file, state] : files) {
         if (state == modified_indicator::modified) {
@@ -137,11 +146,23 @@ void ldcf_schema::flush_commit()
 void ldcf_schema::flush_rollback()
 {
     std::exception_ptr first_failure;
+    try {
+        // What a failed commit could not put back is tried once more. When it fails again the temporary files stay:
+        // they tell the next start that the commit was not through.
+        if (ldcf_recovery leftovers(*this); leftovers.commit_interrupted()) {
+            leftovers.run();
+        }
+    } catch (const exc_t&) {
+        first_failure = std::current_exception();
+    }
+    const bool put_back = !first_failure;
     for (auto& [file, state] : files) {
         if (state == modified_indicator::modified) {
             state = modified_indicator::flushed;
             try {
-                remove_if_there(temporary_of(file));
+                if (put_back) {
+                    remove_if_there(ldcf_temporary_of(file));
+                }
             } catch (const exc_t&) {
                 first_failure = first_failure ? first_failure : std::current_exception();
             }

@@ -3,6 +3,7 @@
 
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libmsg/message_log.h"
+#include "servers/vrnd/libdirbase/schema/ldcf_schema_recover.h"
 
 namespace {
 
@@ -31,6 +32,9 @@ void vote(ldcf_modify_op op, T& definition)
     ldcf_schema& proposed = spare_schema();
     ldcf_schema_proposed_g = &proposed;
     proposed.clear();  // a change that was never cleaned up must not shine through
+    if (ldcf_recovery leftovers(*ldcf_schema_g); leftovers.commit_interrupted()) {
+        leftovers.run();  // nor what its commit left on disk, which the next commit would take for its own
+    }
     proposed.copy(*ldcf_schema_g);
     switch (op) {
     case ldcf_modify_add: proposed.insert(definition); break;
