@@ -18,7 +18,8 @@ extern "C" {
 //
 // The word behind the OID tells the criticality, "true" or "false", on whichever side of the ":"; any other is the
 // value of a control that isn't critical, and ends at a space, ":" or line end. Behind a criticality a plain value is
-// all that follows the ":" up to the line end, spaces included.
+// all that follows the ":" up to the line end, spaces included; with a blank in front of the ":" that mark belongs to
+// it. A Base64 value that reads "true" or "false" is taken for the criticality.
 //
 // Returns a new control for the caller to release with ldap_control_free. Null, with a line in the debug log, for null
 // arguments, without an OID, for bad Base64, a file that can't be read, and without memory.

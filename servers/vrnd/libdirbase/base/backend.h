@@ -14,13 +14,14 @@ struct Backend {
     Backend* be_next = nullptr;     // next on the list
 
     // What stands in front of the names of a relational store's tables, for example their owner, and the table that
-    // holds entry-level attributes. The texts stay with the back end.
+    // holds entry-level attributes. The texts stay with the back end; null stands for none, and for LDAP_ENTRY.
     const char* (*be_table_qualifier)(Backend* be) = nullptr;
     const char* (*be_entry_table)(Backend* be) = nullptr;
 
     // May add to the record of an attribute type that has just been made, before anybody else sees it. It may run in
-    // any look-up, while other threads wait to make theirs: it takes no lock that callers of look-ups hold, asks for no
-    // record of the same type, and raises nothing. What it hangs on back_end_list is given to free() with the record.
+    // any look-up, before index_action and the four members about protection are filled, while other threads wait to
+    // make theirs: it takes no lock that callers of look-ups hold, asks for no record of the same type, and raises
+    // nothing. What it hangs on back_end_list is given to free() with the record.
     void (*be_fill_attr_info)(asyntaxinfo* info) = nullptr;
 };
 

@@ -55,17 +55,25 @@ bool attr_index::add(Attribute& attr) noexcept
     }
 }
 
-void attr_index::remove(const Attribute& attr) noexcept
+bool attr_index::remove(const Attribute& attr) noexcept
 {
     const auto of_key = by_key_.find(attr_key(attr.a_info, attr.a_type));
     if (of_key == by_key_.end()) {
-        return;
+        return false;
     }
     versions& left = of_key->second;
-    left.by_tag.erase(find_language_tag(attr.a_type));
+    const auto version = left.by_tag.find(find_language_tag(attr.a_type));
+    // The text of a key or a tag may be this record's and stand for other versions, too.
+    if (version == left.by_tag.end() || version->second != &attr) {
+        return false;
+    }
+    left.by_tag.erase(version);
     if (left.by_tag.empty()) {
         by_key_.erase(of_key);
-    } else if (left.lowest == &attr) {
+        return true;
+    }
+    if (left.lowest == &attr) {
         left.lowest = attr.a_sorted_next;  // the records of a key stand side by side
     }
+    return of_key->first != attr.a_type;
 }

@@ -40,8 +40,9 @@ public:
     // Takes in a record that stands on the lists already. False without memory: the index is no good any more.
     bool add(Attribute& attr) noexcept;
 
-    // Takes out a record that still has its links.
-    void remove(const Attribute& attr) noexcept;
+    // Takes out a record that still has its links. False when it isn't found where its key and tag say, since the
+    // schema has learned its type meanwhile: the index is no good any more.
+    bool remove(const Attribute& attr) noexcept;
 
 private:
     struct key_less {

@@ -37,6 +37,12 @@ bool is_tagged(const Attribute& attr)
     return named != nullptr ? named->is_tagged : has_tag(find_language_tag(attr.a_type));
 }
 
+bool is_extra(const Attribute& attr)
+{
+    const named_attribute* const named = named_attribute::of(attr);
+    return named != nullptr && named->is_extra;
+}
+
 bool is_version(const Attribute& attr, const asyntaxinfo* info, const char* tag)
 {
     if (attr.a_info != info) {
@@ -135,7 +141,8 @@ Attribute* new_attribute(const char* name, asyntaxinfo* info)
     attr.a_syntax = static_cast<std::int32_t>(info == nullptr ? SC_CIS : info->syntax);
     attr.a_info = info;
     made->is_tagged = has_tag(find_language_tag(name));
-    made->type_length = static_cast<std::size_t>(strchrnul(name, ':') - name);
+    made->is_extra = made->is_tagged || info == nullptr;
+    made->type_length = static_cast<std::uint32_t>(strchrnul(name, ':') - name);
     return &attr;
 }
 
@@ -148,7 +155,7 @@ void link_attribute(Entry& entry, Attribute& attr, const sorted_neighbours& plac
     attr.a_prev = entry.e_attrs_tail;
     (entry.e_attrs_tail == nullptr ? entry.e_attrs : entry.e_attrs_tail->a_next) = &attr;
     entry.e_attrs_tail = &attr;
-    entry.e_tagged += is_tagged(attr) ? 1 : 0;
+    entry.e_extra_versions += is_extra(attr) ? 1 : 0;
 }
 
 // Keeps the index true to a new record, or makes it where a walk was long. Without memory the entry goes on without.
@@ -165,14 +172,14 @@ void index_attribute(Entry& entry, Attribute& attr, int passed)
 
 void unlink_attribute(Entry& entry, Attribute& attr)
 {
-    if (entry.e_index != nullptr) {
-        entry.e_index->remove(attr);
+    if (entry.e_index != nullptr && !entry.e_index->remove(attr)) {
+        delete std::exchange(entry.e_index, nullptr);
     }
     (attr.a_sorted_prev == nullptr ? entry.e_sorted_low : attr.a_sorted_prev->a_sorted_next) = attr.a_sorted_next;
     (attr.a_sorted_next == nullptr ? entry.e_sorted_high : attr.a_sorted_next->a_sorted_prev) = attr.a_sorted_prev;
     (attr.a_prev == nullptr ? entry.e_attrs : attr.a_prev->a_next) = attr.a_next;
     (attr.a_next == nullptr ? entry.e_attrs_tail : attr.a_next->a_prev) = attr.a_prev;
-    entry.e_tagged -= is_tagged(attr) ? 1 : 0;
+    entry.e_extra_versions -= is_extra(attr) ? 1 : 0;
 }
 
 // The slot of a new record: a version without a tag takes it over from one with a tag.
@@ -208,14 +215,23 @@ int find_by_name(const Entry& entry, const char* name, const asyntaxinfo* info, 
     return too_long ? LDAP_INVALID_SYNTAX : LDAP_SUCCESS;
 }
 
-// Puts what attr_find finds into *attr, and returns the attribute's first version in order of arrival. Both come from
-// one walk over the records, where a walk is needed.
+// Puts what attr_find finds into *attr, which is null, and returns the attribute's first version in order of arrival
+// (for a name with a tag whose version is there, that one). Both come from one walk over the records, where a walk is
+// needed.
 Attribute* find_by_name_or_tag(const Entry& entry, const char* name, const asyntaxinfo* info, Attribute** attr)
 {
-    const char* const tag = find_language_tag(name);
+    const bool is_tagged_name = has_tag(find_language_tag(name));
+    if (is_tagged_name) {
+        find_by_name(entry, name, info, attr);
+        if (*attr != nullptr) {
+            return *attr;
+        }
+    }
     Attribute* const earliest = next_of(entry.e_attrs, info);
-    if (has_tag(tag) || earliest == nullptr || entry.e_index != nullptr ||
-        slot_of(const_cast<Entry&>(entry), info, false) != nullptr) {
+    if (is_tagged_name || earliest == nullptr) {
+        return earliest;
+    }
+    if (entry.e_index != nullptr || slot_of(const_cast<Entry&>(entry), info, false) != nullptr) {
         find_by_name(entry, name, info, attr);
         return earliest;
     }
@@ -297,6 +313,7 @@ int attr_find_attr_or_lang_tag_version(const Entry* entry, const char* name, int
     if (*info == nullptr) {
         *info = ldcf_api_attr_get_info(name, nullptr);
     }
+    *attr = nullptr;
     Attribute* const earliest = find_by_name_or_tag(*entry, name, *info, attr);
     if (*attr == nullptr) {
         *tag_state = contains_valid_language_tag(name) ? 1 : 0;
@@ -325,7 +342,7 @@ int attr_find_next_attr_match(const Entry* entry, const char* name, int* started
     if (*started == walk_not_started) {
         *started = walk_in_order;
         *attr = next_of(entry->e_attrs, info);
-    } else if (entry->e_tagged == 0) {
+    } else if (entry->e_extra_versions == 0) {
         // The previous version was the one without a tag, and there are no others.
     } else if (*started == walk_in_order) {
         *attr = next_of(previous->a_next, info);

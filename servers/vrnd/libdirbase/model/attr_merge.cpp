@@ -117,7 +117,8 @@ int attr_merge(Entry* entry, const char* name, berval** values, int drop_duplica
 int attr_merge_fast(Entry* entry, const char* name, berval** values, std::int64_t /*old_count*/, std::int64_t added,
                     std::int64_t* capacity, Attribute** attr, asyntaxinfo* info)
 {
-    if (entry == nullptr || name == nullptr || capacity == nullptr || attr == nullptr) {
+    if (entry == nullptr || name == nullptr || capacity == nullptr || attr == nullptr || added < 0 ||
+        (values == nullptr && added != 0)) {
         return LDAP_OTHER;
     }
     if (*attr == nullptr) {

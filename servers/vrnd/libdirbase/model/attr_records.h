@@ -12,8 +12,9 @@ struct named_attribute {
     static constexpr std::size_t unit = 16;
 
     Attribute attribute;
-    std::size_t type_length;  // of the name, up to its first ":"
-    bool is_tagged;           // whether the name has a language tag
+    std::uint32_t type_length;  // of the name, up to its first ":"
+    bool is_tagged;             // whether the name has a language tag
+    bool is_extra;              // whether e_extra_versions counts it
 
     char* name() { return reinterpret_cast<char*>(this + 1); }
 
@@ -24,6 +25,8 @@ struct named_attribute {
         return attr.a_type == reinterpret_cast<const char*>(whole + 1) ? whole : nullptr;
     }
 };
+// A name that somebody puts into a block of its own can't stand right behind a record then.
+static_assert(sizeof(named_attribute) % 16 != 0);
 
 // ---- the two steps of attr_merge ------------------------------------------------------------------------------------
 

@@ -38,8 +38,8 @@ DIRBASE_EXPORT void free_AttrvalsNorm(AttrvalsNorm* node);
 // Whether an attribute has a value: 0 when it has, 1 when it hasn't, -1 when that can't be told, since there is no tree
 // or the value is none of the syntax (or memory ran out); the caller then looks for himself.
 //
-//   syntax     with SC_BIN the values are compared byte for byte, one after the other, and the tree isn't used
-//   normalize  0: `value` is in normal form already
+//   syntax the code of the tree's nodes, which is the attribute's; with SC_BIN the values are compared byte for byte,
+//   one after the other, and the tree isn't used normalize 0: `value` is in normal form already
 //
 // The value "default" of `ownersource` and `aclsource` is found as it is stored, without being normalised
 // (value_add.h).
@@ -49,8 +49,8 @@ DIRBASE_EXPORT int value_find(const Attribute* attr, const berval* value, std::u
 // at one value after the other, so it is for lists that the caller thinks short.
 DIRBASE_EXPORT int value_find_short_list(const Attribute* attr, const char* text, std::int64_t length);
 
-// Takes a value, which is normalised first, out of the tree; the value array is the caller's to change. Returns
-// LDAP_SUCCESS, also without a tree and when the value isn't in it, or the failure to make a node.
+// Takes a value of the attribute's syntax, which is normalised first, out of the tree; the value array is the caller's
+// to change. Returns LDAP_SUCCESS, also without a tree and when the value isn't in it, or the failure to make a node.
 DIRBASE_EXPORT int delete_valuetree_value(Attribute* attr, const berval* value, std::uint32_t syntax);
 
 }  // extern "C"

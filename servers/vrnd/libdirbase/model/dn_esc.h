@@ -15,10 +15,11 @@
 // other characters than letters, digits and hyphens. That is why a DN is refused whose canonical text would end in an
 // empty value ("cn=", "cn=," or a pair of quotes). A byte 0 written as a hexadecimal pair is refused because texts end
 // there. In values that are folded to upper case, so is everything that utfToUpper refuses: bytes that aren't UTF-8,
-// and characters above U+FFFF.
+// and characters above U+FFFF; and so are characters in more bytes than they take.
 //
-// The upper text is made of the canonical one, in whose order it stays: where two pairs of an RDN differ in no more
-// than the case of letters outside ASCII, two spellings may have two upper texts.
+// The upper text is made of the canonical one, in whose order it stays. So where an RDN has one type twice, which
+// X.501 forbids, the order of its pairs may depend on the case of letters outside ASCII, and pairs of a case-exact type
+// that differ in case alone stay as they came: two spellings may have two upper texts then.
 //
 // A record is built whole by one call and only read afterwards, by one thread or many; it owns its chain and its texts.
 // Nothing here raises an exception, and no argument may be null where that isn't said. Functions with a schema

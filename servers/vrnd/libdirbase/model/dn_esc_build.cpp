@@ -47,11 +47,23 @@ char* write(char* out, const char* text, std::size_t length)
     return out + length;
 }
 
-// Folds so many bytes of a text that ends there to upper case. False when they aren't UTF-8; a zero byte among them was
-// an overlong form.
+// Whether a text that ends there has a character in more bytes than it takes (RFC 3629 forbids that). Folding would
+// write its proper form, be it a comma or a quote, behind the back of the escapes.
+bool has_overlong_form(const char* text, std::size_t length)
+{
+    const auto* const bytes = reinterpret_cast<const unsigned char*>(text);
+    for (std::size_t i = 0; i < length; ++i) {
+        if (bytes[i] == 0xC0 || bytes[i] == 0xC1 || (bytes[i] == 0xE0 && bytes[i + 1] >= 0x80 && bytes[i + 1] < 0xA0)) {
+            return true;
+        }
+    }
+    return false;
+}
+
+// Folds so many bytes of a text that ends there to upper case. False when they aren't UTF-8.
 bool fold(char* text, std::size_t length)
 {
-    return utfToUpper(text) == 0 && std::memchr(text, '\0', length) == nullptr;
+    return !has_overlong_form(text, length) && utfToUpper(text) == 0;
 }
 
 char* write_pair(char* out, const ldapRDN_struct33& pair)
@@ -210,10 +222,13 @@ char* dn_upcase_esc(ldap_escDN* dn)
     } else {
         char* out = text.get();
         for (const ldapDN_elem33* rdn = dn->rdns; rdn != nullptr; rdn = rdn->next) {
-            out = write_upper_pairs(out, rdn->pairs, good);
-            if (rdn->next != nullptr) {
+            if (rdn->pairs == nullptr) {
+                continue;  // the canonical text has nothing of it, either
+            }
+            if (out != text.get()) {
                 *out++ = ',';
             }
+            out = write_upper_pairs(out, rdn->pairs, good);
         }
     }
     if (!good) {

@@ -5,8 +5,9 @@
 // elsewhere: dn_esc.h.
 //
 // Texts are zero-terminated UTF-8 of any length, changed in place; the result never grows. All may be called from any
-// thread on texts that no other thread touches meanwhile. What looks types up in the active schema says so; its caller
-// holds the read side of the schema lock.
+// thread on texts that no other thread touches meanwhile. None is null, but for those of dn_normalize,
+// dn_normalize_case, dn_normalize_light, dn_upcase, dn_compare, dn_attr_get_short_name and ShortRDNType. What looks
+// types up in the active schema says so; its caller holds the read side of the schema lock.
 #pragma once
 
 #include "libraries/dirbase_export.h"

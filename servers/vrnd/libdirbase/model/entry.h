@@ -46,13 +46,14 @@ struct Entry {
     std::int64_t e_uniquemember_count;
 
     // The library's own.
-    attr_index* e_index;    // made once an entry has very many attributes, else null
-    std::int32_t e_tagged;  // how many of the attributes have a language tag
+    attr_index* e_index;            // made once an entry has very many attributes, else null
+    std::int32_t e_extra_versions;  // how many records may be further versions of an attribute: those with a language
+                                    // tag, and those that the schema didn't know when they came
 };
 
 extern "C" {
 
-// Makes a zeroed entry. Returns LDAP_SUCCESS, or LDAP_NO_MEMORY with *entry null.
+// Makes a zeroed entry. Returns LDAP_SUCCESS, LDAP_OTHER for a null argument, or LDAP_NO_MEMORY with *entry null.
 DIRBASE_EXPORT int CreateEntry(Entry** entry);
 
 // Releases an entry with all that it owns. An entry that belongs to a cache (ENTRY_IN_CACHE) stays as it is, with a
@@ -60,8 +61,8 @@ DIRBASE_EXPORT int CreateEntry(Entry** entry);
 DIRBASE_EXPORT void entry_free(Entry* entry);
 
 // Whether the entry holds a value of an attribute. `value` has `length` bytes. Values of `objectclass`, and of an
-// attribute without a value tree, compare without regard to the case of ASCII letters, others by their syntax. False
-// for a null argument.
+// attribute without a value tree, compare without regard to the case of ASCII letters and up to a byte 0, others by
+// their syntax. So of binary values the answer may be true for others of that length. False for a null argument.
 DIRBASE_EXPORT bool verify_attribute(const Entry* entry, const char* name, const char* value, std::size_t length);
 
 // Removes the values of a modification, which are bervals, or for one without values the whole attribute. The value

@@ -42,6 +42,28 @@ struct text_form {
     const char* writer;  // for the debug log
 };
 
+// MAKE_SPACE without a word about a failure.
+bool make_space(std::size_t needed, char** buffer, char** cursor, std::size_t* size)
+{
+    const std::size_t used = *buffer == nullptr ? 0 : static_cast<std::size_t>(*cursor - *buffer);
+    const std::size_t step = needed <= growth_step ? growth_step : needed / growth_step * growth_step + growth_step;
+    std::size_t grown = *buffer == nullptr ? 0 : *size;
+    while (grown == 0 || grown < used + needed) {
+        grown += step;
+    }
+    if (*buffer != nullptr && grown == *size) {
+        return true;
+    }
+    auto* block = static_cast<char*>(std::realloc(*buffer, grown));
+    if (block == nullptr) {
+        return false;
+    }
+    *buffer = block;
+    *cursor = block + used;
+    *size = grown;
+    return true;
+}
+
 // A growing buffer that a caller owns.
 class text_buffer {
 public:
@@ -155,9 +177,9 @@ private:
     bool grow(std::size_t needed)
     {
         cursor_ = at_;
-        int error = 0;
-        MAKE_SPACE(std::max(needed, static_cast<std::size_t>(at_ - start_) / 2), &error, &start_, &cursor_, &size_);
-        if (error != LDAP_SUCCESS) {
+        int error = LDAP_SUCCESS;
+        const std::size_t generous = std::max(needed, static_cast<std::size_t>(at_ - start_) / 2);
+        if (!make_space(generous, &start_, &cursor_, &size_)) {
             MAKE_SPACE(needed, &error, &start_, &cursor_, &size_);
         }
         take_over();
@@ -310,25 +332,11 @@ void unlockEnt2StrMutex(void)
 void MAKE_SPACE(std::size_t needed, int* error, char** buffer, char** cursor, std::size_t* size)
 {
     *error = LDAP_SUCCESS;
-    const std::size_t used = *buffer == nullptr ? 0 : static_cast<std::size_t>(*cursor - *buffer);
-    const std::size_t step = needed <= growth_step ? growth_step : needed / growth_step * growth_step + growth_step;
-    std::size_t grown = *buffer == nullptr ? 0 : *size;
-    while (grown == 0 || grown < used + needed) {
-        grown += step;
-    }
-    if (*buffer != nullptr && grown == *size) {
-        return;
-    }
-    auto* block = static_cast<char*>(std::realloc(*buffer, grown));
-    if (block == nullptr) {
+    if (!make_space(needed, buffer, cursor, size)) {
         message_no_memory();
         debug_error("Error - MAKE_SPACE: realloc for newebuf failed. Out of memory\n");
         *error = LDAP_NO_MEMORY;
-        return;
     }
-    *buffer = block;
-    *cursor = block + used;
-    *size = grown;
 }
 
 char* entry2str_options(const Entry* entry, std::size_t* length, int options)

@@ -29,7 +29,8 @@ constexpr int FILTER_FALSE = -1;
 extern "C" {
 
 // Evaluates a filter. The first call in a process asks for the environment variable OC_ALIAS: "YES" in any case has
-// equality tests on objectclass take any name of a class, or its OID, for its first name.
+// equality tests on objectclass take any name of a class, or its OID, for its first name. Without memory to read it the
+// variable counts as not set.
 //
 // Results above 0: LDAP_OPERATIONS_ERROR for an unknown choice, a null argument, and where the attribute or a tree
 // can't be searched; LDAP_FILTER_ERROR for a comparison that the attribute's syntax doesn't have; LDAP_NOT_SUPPORTED
@@ -54,9 +55,10 @@ DIRBASE_EXPORT int test_approx_filter(const Entry* entry, const ava* assertion);
 // Substrings: the pieces occur in their order without overlap, the initial one at the start and the final one at the
 // end. Bytes are compared; a zero byte ends a value.
 //
-// LDAP_OPERATIONS_ERROR, with a line in the debug log, for pieces that exceed the pattern space of 1022 bytes: each is
-// counted with one byte more for each of $ * + . [ \ ] ^ in it, and one for "^" or "$" or two for what lies between
-// pieces, and must have room for twice its length and 2 before it is added. That is told of attributes that are there.
+// LDAP_OPERATIONS_ERROR for a filter of another choice, and, with a line in the debug log, for pieces that exceed the
+// pattern space of 1022 bytes: each is counted with one byte more for each of $ * + . [ \ ] ^ in it, and one for "^" or
+// "$" or two for what lies between pieces, and must have room for twice its length and 2 before it is added. That is
+// told of attributes that are there.
 DIRBASE_EXPORT int test_substring_filter(const Entry* entry, const Filter* filter);
 
 // Copies a text with a backslash in front of each of $ * + . [ \ ] ^, which have a meaning in patterns.

@@ -37,15 +37,6 @@ const char* skip_oid_prefix(const char* name)
     return has_oid_prefix(name) ? name + oid_prefix_length : name;
 }
 
-// The record of the type of a name with ";binary", if its syntax is that.
-[[gnu::noinline]] asyntaxinfo* binary_info(const char* name, std::size_t length)
-{
-    const heap_text plain = ldcf_without_binary(name, length);
-    asyntaxinfo* info =
-        plain == nullptr ? nullptr : ldcf_attrtype_get_info(ldcf_schema_g->attribute_types, plain.get());
-    return info != nullptr && info->syntax == SC_BIN ? info : nullptr;
-}
-
 // Looks a name up in a map; a handle is never made for it, so that readers don't meet in its counter.
 template <typename T>
 const T* find(const ldcf_map_name_to<T>& map, const char* name)
@@ -54,24 +45,54 @@ const T* find(const ldcf_map_name_to<T>& map, const char* name)
     return found == map.end() ? nullptr : &found->second;
 }
 
+// The record of the type whose name is the first `length` bytes of a text. Nothing is allocated for names of ordinary
+// length, so that a lack of memory doesn't look like an unknown type.
+asyntaxinfo* info_of_front(const char* name, std::size_t length)
+{
+    if (const ldcf_hash_tbl_entry* node = ldcf_find_node(name, length); node != nullptr) {
+        return node->info;
+    }
+    char shorter[256];
+    heap_text longer(length < sizeof shorter ? nullptr : static_cast<char*>(std::malloc(length + 1)));
+    char* const front = length < sizeof shorter ? shorter : longer.get();
+    if (front == nullptr) {
+        return nullptr;
+    }
+    std::memcpy(front, name, length);
+    front[length] = '\0';
+    return ldcf_attrtype_get_info(ldcf_schema_g->attribute_types, front);
+}
+
+// The record of the type of a name with ";binary", if its syntax is that.
+[[gnu::noinline]] asyntaxinfo* binary_info(const char* name, std::size_t length)
+{
+    asyntaxinfo* info = info_of_front(name, length - ldcf_binary_ending_length);
+    return info != nullptr && info->syntax == SC_BIN ? info : nullptr;
+}
+
 // What the cache doesn't hold. Kept apart from the common look-up, which is a few steps without it.
 [[gnu::noinline]] asyntaxinfo* uncached_info(const char* name, char** base_out)
 {
-    char* parsed = nullptr;
-    const int result = parse_language_tags(name, &parsed, nullptr, LANGUAGE_BASE);
-    heap_text base(parsed);
+    const char* const tag = find_language_tag(name);
     if (base_out != nullptr) {
         *base_out = nullptr;
     }
-    if (result != LDAP_SUCCESS) {
+    if (tag != nullptr && std::strlen(tag) > longest_language_tag) {
         debug_error("ldcf_api_attr_get_info(): parse_language_tags() failed.\n");
         return nullptr;
     }
-    asyntaxinfo* info = ldcf_attrtype_get_info(ldcf_schema_g->attribute_types, base == nullptr ? name : base.get());
-    if (base_out != nullptr) {
-        *base_out = base.release();
+    if (tag == nullptr) {
+        return ldcf_attrtype_get_info(ldcf_schema_g->attribute_types, name);
     }
-    return info;
+    const auto base_length = static_cast<std::size_t>(tag - 1 - name);
+    if (base_out != nullptr) {
+        *base_out = strndup(name, base_length);
+        if (*base_out == nullptr) {
+            debug_error("ldcf_api_attr_get_info(): parse_language_tags() failed.\n");
+            return nullptr;
+        }
+    }
+    return info_of_front(name, base_length);
 }
 
 }  // namespace

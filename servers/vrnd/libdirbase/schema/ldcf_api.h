@@ -107,8 +107,8 @@ DIRBASE_EXPORT void ldcf_api_delete_objectclassinfo(objectclassinfo* info);
 // lacks does nothing.
 DIRBASE_EXPORT void ldcf_api_attrtype_reset_info(const char* name);
 
-// The table of a record (null without tables; not to be changed), and what to do with the text afterwards: nothing, it
-// stays with the record.
+// The table of a record, which isn't null (null without tables; not to be changed), and what to do with the text
+// afterwards: nothing, it stays with the record.
 DIRBASE_EXPORT char* get_qualified_table_name(asyntaxinfo* info);
 DIRBASE_EXPORT void free_qualified_table_name(char* name);
 

@@ -135,7 +135,7 @@ private:
     int check_entry_dn()
     {
         const int result = entry_.e_norm_dn != nullptr ? LDAP_SUCCESS : normalize_result(entry_.e_dn, LDAP_SUCCESS);
-        if (result != LDAP_SUCCESS) {
+        if (result != LDAP_SUCCESS && result != LDAP_NO_MEMORY) {
             log_.report(kind::entry_dn_invalid);
         }
         return result;
@@ -160,7 +160,9 @@ private:
         std::int64_t place = 0;
         int result = check_dn_values(attr, place);
         if (result != LDAP_SUCCESS) {
-            log_.report(kind::value_dn_invalid, attr.a_type, place);
+            if (result != LDAP_NO_MEMORY) {
+                log_.report(kind::value_dn_invalid, attr.a_type, place);
+            }
             return result;
         }
         ldcf_type_pointer type = nullptr;
@@ -232,7 +234,8 @@ private:
     int take(const berval& value)
     {
         const ldcf_value_text name(value);
-        const ldcf_class_pointer objclass = ldcf_class_named(schema_, name.c_str());
+        const bool is_whole = std::strlen(name.c_str()) == value.bv_len;  // no class has a byte 0 in its name
+        const ldcf_class_pointer objclass = is_whole ? ldcf_class_named(schema_, name.c_str()) : nullptr;
         if (objclass == nullptr) {
             return log_.violation(kind::class_undefined, name.c_str());
         }

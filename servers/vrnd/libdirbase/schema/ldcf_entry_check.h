@@ -35,7 +35,9 @@ enum ldcf_schema_check_mode : int {
 // Returns LDAP_SUCCESS; LDAP_OBJECT_CLASS_VIOLATION; LDAP_INVALID_DN_SYNTAX or LDAP_UNDEFINED_TYPE for a DN, of the
 // entry or a value; LDAP_INVALID_SYNTAX (the older check only); LDAP_NO_MEMORY. With all but the first and the last a
 // fault was reported. An alias or a referral is judged by check_aliasObject or check_referralObject in place of the
-// tests by sets: one without a structural class has that reported and may pass all the same. Raises
+// tests by sets: one without a structural class has that reported and may pass all the same. The entry's own DN is
+// looked at only while e_norm_dn is null (the older check always looks): str2entry and LDAPModToEntry have normalised
+// it, with an empty or cut e_norm_dn for a bad DN, which is no fault here. Raises
 // exc_not_enough_memory_t, and what the sink raises.
 DIRBASE_EXPORT int ldcf_check_entry(const ldcf_schema& schema, Entry* entry, int mode, bool policy, bool* added,
                                     ldcf_entry_sink& sink);
@@ -43,7 +45,8 @@ DIRBASE_EXPORT int ldcf_check_entry(const ldcf_schema& schema, Entry* entry, int
 extern "C" {
 
 // Checks an entry against the active schema, in the mode of ldcf_api_get_schema_check, as ldcf_check_entry does; faults
-// go to the logs. An exception ends here with LDAP_OPERATIONS_ERROR.
+// go to the logs. An exception ends here with LDAP_OPERATIONS_ERROR, but for lack of memory in the older check, which
+// is LDAP_NO_MEMORY.
 DIRBASE_EXPORT int ldcf_api_schema_check(Entry* entry, bool* added, bool policy);
 
 // Normalises each value of an attribute whose record says that its values are DNs. Returns LDAP_SUCCESS, also for any
@@ -52,8 +55,8 @@ DIRBASE_EXPORT int ldcf_api_schema_check(Entry* entry, bool* added, bool policy)
 DIRBASE_EXPORT int check_dn_in_attr(const ldcf_schema* schema, const Attribute* attr);
 
 // Whether an alias has its one aliasedObjectName or aliasedEntryName, and whether a referral has a `ref`; all other
-// attributes must be known. What the classes require and permit isn't looked at. Return LDAP_SUCCESS or
-// LDAP_OBJECT_CLASS_VIOLATION, with a line in the debug log.
+// attributes must be known. The entry isn't null. What the classes require and permit isn't looked at. Return
+// LDAP_SUCCESS or LDAP_OBJECT_CLASS_VIOLATION, with a line in the debug log.
 DIRBASE_EXPORT int check_aliasObject(const Entry* entry);
 DIRBASE_EXPORT int check_referralObject(const Entry* entry);
 

@@ -24,8 +24,8 @@ struct ldcf_hash_tbl_entry {
 
 extern "C" {
 
-// The slot of a key: the hash of ELF symbol tables over its bytes as they stand, taken as signed. A name is folded
-// first.
+// The slot of a key, which isn't null: the hash of ELF symbol tables over its bytes as they stand, taken as signed. A
+// name is folded first.
 DIRBASE_EXPORT std::uint32_t ldcf_hash_name(const char* key);
 
 // The node of a name, without regard to case (only bytes from 'a' to 0x7f fold); null when the cache lacks it, the name

@@ -14,7 +14,7 @@ extern "C" {
 // alias classes require.
 //
 // Returns LDAP_SUCCESS, LDAP_OBJECT_CLASS_VIOLATION, LDAP_INVALID_DN_SYNTAX, LDAP_INVALID_SYNTAX or LDAP_NO_MEMORY;
-// faults go to the message log, all missing attributes, or else all that aren't permitted.
+// a null entry passes. Faults go to the message log, all missing attributes, or else all that aren't permitted.
 DIRBASE_EXPORT int ldcf_oc_schema_check(const Entry* entry);
 
 // Whether an entry has a value of every attribute that a class itself requires: 0, or 1 with a message for each that

@@ -95,7 +95,8 @@ csgl_string ldcf_rdbm::normalize_table_name(const csgl_string& name, int access_
     const bool own_table =
         std::find(std::begin(own_tables), std::end(own_tables), std::string_view(name.c_str())) != std::end(own_tables);
     if (access_class == access_class_system && !own_table) {
-        return be->be_entry_table == nullptr ? default_entry_table : be->be_entry_table(be);
+        const char* const table = be->be_entry_table == nullptr ? nullptr : be->be_entry_table(be);
+        return table == nullptr ? default_entry_table : table;
     }
 
     csgl_string table = name;

@@ -115,11 +115,13 @@ constexpr rule_code ordering_codes[] = {
     {ldcf_rule_generalized_time_ordering, SC_GT},
 };
 
+// By the rule that a definition's text led to, or by the text itself where it leads nowhere.
 template <std::size_t count>
-unsigned find_rule(const rule_code (&codes)[count], const csgl_string& rule)
+unsigned find_rule(const rule_code (&codes)[count], const csgl_string& text, const ldcf_matchrule& rule)
 {
     for (const rule_code& known : codes) {
-        if (rule == known.rule.oid || rule == known.rule.name) {
+        if ((rule && rule.oid() == known.rule.oid) || text == known.rule.oid ||
+            csgl_str_ci_compare(text, known.rule.name) == 0) {
             return known.code;
         }
     }
@@ -238,11 +240,11 @@ private:
             debug_error("ldcf_rdbm::fill_ayntaxinfo: Invalid syntax: %s\n", attribute_.syntax_oid().c_str());
             return false;
         }
-        info_.equality = find_rule(equality_codes, attribute_.equality());
+        info_.equality = find_rule(equality_codes, attribute_.equality(), attribute_.equality_rule());
         keep_case_if_exact(info_.equality);
-        info_.substring = find_rule(substring_codes, attribute_.substr());
+        info_.substring = find_rule(substring_codes, attribute_.substr(), attribute_.substr_rule());
         keep_case_if_exact(info_.substring);
-        info_.ordering = find_rule(ordering_codes, attribute_.ordering());
+        info_.ordering = find_rule(ordering_codes, attribute_.ordering(), attribute_.ordering_rule());
         keep_case_if_exact(info_.ordering);
         return true;
     }
@@ -368,11 +370,11 @@ asyntaxinfo* ldcf_rdbm::fill_asyntaxinfo(const ldcf_attrtype& attribute)
         debug_error("ldcf_rdbm::fill_asyntaxinfoasyntaxinfo malloc failed!\n");
         return nullptr;
     }
+    info->type = attribute.get();
     if (!info_filler(attribute, *info).fill()) {
         free_record(info);
         return nullptr;
     }
-    info->type = attribute.get();
     return info;
 }
 

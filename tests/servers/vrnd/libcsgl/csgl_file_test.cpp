@@ -134,6 +134,7 @@ TEST(FileRename, NoTwoNamesOfOneFileLoseIt)
     const std::string cases[][3] = {
         {"a", "b", "-A"}, {"a", "new", "-A"}, {"a", "twin", "-A"}, {"twin", "a", "-A"}, {"again/twin", "a", "-A"},
         {"a", "a", "AA"}, {"a", "./a", "AA"}, {"a", "again/a", "AA"}, {"link", "a", "-A"}, {"a", "link", "-A"},
+        {"on", "link", "-A"},
         {"none", "new", missing + "--"}, {"a", "none/a", missing + "A-"}};
     // clang-format on
     for (const auto& [from, to, expected] : cases) {
@@ -142,6 +143,7 @@ TEST(FileRename, NoTwoNamesOfOneFileLoseIt)
         dir.write("b", "B");
         fs::create_hard_link(source, dir.path("twin"));
         fs::create_symlink("a", dir.path("link"));
+        fs::create_symlink("link", dir.path("on"));
         fs::create_symlink(".", dir.path("again"));
         const std::string in_the_way = "exc_already_exists_t: exc_already_exists";
         EXPECT_EQ(raised([&] { csgl_file::rename(source.c_str(), dir.path("b").c_str()); }), in_the_way);
@@ -150,6 +152,13 @@ TEST(FileRename, NoTwoNamesOfOneFileLoseIt)
             [&, f = dir.path(from), t = dir.path(to)] { csgl_file::rename(f.c_str(), t.c_str(), csgl_file_force); });
         EXPECT_EQ(text + content(dir, from) + content(dir, to), expected) << from << " to " << to;
     }
+    // What can't be linked leaves the target alone.
+    const temp_dir dir;
+    dir.write("b", "B");
+    fs::create_directory(dir.path("folder"));
+    EXPECT_NE(raised([&] { csgl_file::rename(dir.path("folder").c_str(), dir.path("b").c_str(), csgl_file_force); }),
+              "");
+    EXPECT_EQ(content(dir, "b"), "B");
 }
 
 TEST(OutputFile, KeepsUpTo512BytesBackAndShortWritesRaise)

@@ -279,4 +279,24 @@ TEST_F(DnExpand, TheFirstRdnBecomesAttributes)
     EXPECT_TRUE(expand_rdn(nullptr) == -1 && expand_rdn_esc(nullptr) == -1);
 }
 
+// The keys of the index are texts of the records and of the schema.
+TEST_F(Attributes, AnIndexSurvivesATypeThatBecomesKnown)
+{
+    test_entry entry;
+    ASSERT_EQ(entry.merge("later", {"v"}), 0);
+    for (int i = 199; i >= 100; --i) {
+        ASSERT_EQ(entry.merge(("z" + std::to_string(i)).c_str(), {"v"}), 0);
+    }
+    ASSERT_NE(entry.e_index, nullptr);
+    ldcf_schema_g->parse_str("attributeTypes { ( 9.77 NAME 'later' SYNTAX " ARC "15 ) }", "later");
+    ldcf_schema_g->complete_nocheck();
+    ASSERT_EQ(ldcf_api_schema_complete_db_names(), 0);
+    EXPECT_EQ(entry.merge("later;lang-en", {"w"}), 0);
+    EXPECT_EQ(entry.merge("later", {"w"}), 0);
+    EXPECT_EQ(attr_delete(&entry, "later", nullptr), 0);
+    EXPECT_EQ(entry.values("later;lang-en"), "w");
+    EXPECT_EQ(entry.merge("later;lang-en", {"x"}), 0);
+    EXPECT_EQ(entry.values("later;lang-en"), "w|x");
+}
+
 }  // namespace

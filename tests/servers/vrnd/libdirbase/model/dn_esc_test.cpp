@@ -123,7 +123,7 @@ TEST_F(DnNormalize, WhatIsNoDnIsRefusedAndLeavesEmptyTexts)
         {"cn=#0489", "34, 1"}, {"cn=#048201", "34, 1"}, {"cn=a\\00b", "34, 1"}, {"cn=\"\\00\"", "34, 1"},
         {"cn=#040100", "34, 1"}, {"foo=a", "17, 10"}, {"cn=a,foo=a", "17, 10"}, {"9.9.9=a", "17, 10"},
         {"cn=a\xFF", "34, 34"}, {"o=x,cn=\xC3", "34, 34"}, {"cn=\xF0\x9F\x98\x80", "34, 34"},
-        {"cn=a\xC0\x80" "b", "34, 34"}, {"cn=a\xE9,memberUid=b", "34, 34"},
+        {"cn=a\xC0\x80" "b", "34, 34"}, {"cn=a\xC0\xA2" "b,o=x", "34, 34"}, {"cn=a\xE0\x80\xAC,memberUid=b", "34, 34"}, {"cn=a\xE9,memberUid=b", "34, 34"},
     };
     // clang-format on
     for (const auto& c : cases) {
@@ -500,6 +500,21 @@ TEST_F(DnNormalize, ValuesResolveToTheirBareText)
     }
     EXPECT_EQ(canEscape(' ') + canEscape('#') + canEscape('<'), 3);
     EXPECT_EQ(canEscape('a') + needsEscape(' ') + needsEscape('#'), 0);
+}
+
+TEST_F(DnNormalize, ARecordMayHoldRdnsWithoutPairs)
+{
+    ldap_escDN* dn = new_ldap_escDN(1);
+    for (int i = 0; i < 100; ++i) {
+        ldapDN_elem33* const rdn = new_ldapDN_elem33();
+        if (i == 50) {
+            insert_ldapRDN_elem33(rdn, new_ldapRDN_elem33("a", "b", SC_CES), dn_order_given);
+        }
+        insert_ldapDN_elem33(dn, rdn);
+    }
+    EXPECT_STREQ(BuildDNString33(dn), "a=b");
+    EXPECT_STREQ(dn_upcase_esc(dn), "A=b");
+    free_ldap_escDN(&dn);
 }
 
 }  // namespace

@@ -43,6 +43,8 @@ const std::initializer_list<model_test::attribute_values> person = {
     {"uniqueMember;lang-en", {"cn=x"}},
     {"number", {"-5", "10"}},
     {"flag", {"TRUE"}},
+    {"bits", {"'0101'B"}},
+    {"digits", {"12 "}},
     {"time", {"20240101000000Z"}},
     {"utc", {"240101000000Z"}},
     {"tel", {"+1 555-0100", " -7"}},
@@ -99,6 +101,10 @@ TEST_F(FilterEvaluation, ComparisonsFollowTheSyntaxWithATreeAndWithout)
             {"(objectClass=EMPLOYEE)", 0},
             {"(objectClass=worker)", -1},
             {"(uniqueMember=cn=x)", 0},
+            {"(bits='0101'B)", 0},
+            {"(bits='1'B)", -1},
+            {"(digits= 12)", 0},
+            {"(flag=\\1a)", -1},  // "t" less 90, which isn't the result of that number
         };
         expect_results(entry, table);
         // Only a tree refuses what is no value.

@@ -8,8 +8,8 @@
 
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/server_globals.h"
-#include "servers/vrnd/libdirbase/model/filter_guards.h"
 #include "servers/vrnd/libdirbase/model/filter_evaluation.h"
+#include "servers/vrnd/libdirbase/model/filter_guards.h"
 #include "servers/vrnd/str2filter.h"
 #include "tests/servers/vrnd/libdirbase/model/model_fixture.h"
 
@@ -19,7 +19,10 @@ class Filters : public Model {
 protected:
     Filters()
     {
-        ldcf_schema_g->parse_str("attributeTypes { ( 9.20 NAME 'tel' EQUALITY telephoneNumberMatch SYNTAX " ARC "50 )\n"
+        ldcf_schema_g->parse_str("ldapSyntaxes { ( " ARC "6 ) ( " ARC "36 ) }\n"
+                                 "attributeTypes { ( 9.22 NAME 'bits' SYNTAX " ARC "6 )\n"
+                                 "( 9.23 NAME 'digits' SYNTAX " ARC "36 )\n"
+                                 "( 9.20 NAME 'tel' EQUALITY telephoneNumberMatch SYNTAX " ARC "50 )\n"
                                  "( 9.21 NAME 'utc' SYNTAX " ARC "53 ) }\n"
                                  "objectClasses { ( 8.1 NAME 'top' ABSTRACT MUST objectClass )\n"
                                  "( 8.3 NAME ( 'employee' 'worker' ) SUP top ) }\n",

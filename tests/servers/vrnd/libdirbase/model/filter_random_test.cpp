@@ -59,8 +59,27 @@ private:
 
     const char* name()
     {
-        return pick({"cn", "cn", "commonName;lang-en", "cn;lang-de", "sn", "member", "member;lang-en", "number", "flag",
-                     "time", "cert", "tel", "ref", "ref;lang-en", "oneWay", "twoWay", "objectClass", "utc", "none"});
+        return pick({"cn",
+                     "cn",
+                     "commonName;lang-en",
+                     "cn;lang-de",
+                     "sn",
+                     "member",
+                     "member;lang-en",
+                     "number",
+                     "flag",
+                     "time",
+                     "cert",
+                     "tel",
+                     "ref",
+                     "ref;lang-en",
+                     "oneWay",
+                     "twoWay",
+                     "objectClass",
+                     "utc",
+                     "bits",
+                     "digits",
+                     "none"});
     }
 
     // Half of the time one of the attribute's syntax.
@@ -72,6 +91,9 @@ private:
             }
             if (type == "time" || type == "utc") {
                 return type == "utc" ? "240101000000Z" : pick({"20240101000000Z", "20240101010000+0100"});
+            }
+            if (type == "bits") {
+                return pick({"'0101'B", "'1'b", "'0'B "});
             }
             if (type.starts_with("member")) {
                 return pick({"cn=a", "CN=A", "cn=a,sn=b", "cn=\"c,;+\""});

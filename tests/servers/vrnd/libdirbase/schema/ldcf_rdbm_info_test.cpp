@@ -125,6 +125,7 @@ TEST(LdcfRdbmInfo, SyntaxesAndRulesGiveTheCodesByWhichValuesAreCompared)
     const std::pair<const char*, const char*> cases[] = {
         {"SYNTAX " ARC "15", "1 0 0 0"},
         {"EQUALITY caseExactMatch SYNTAX " ARC "15", "2 2 0 0"},
+        {"EQUALITY CASEexactMATCH SUBSTR caseexactsubstringsmatch SYNTAX " ARC "15", "2 2 2 0"},
         {"EQUALITY 1.3.6.1.4.1.1466.109.114.1 SYNTAX " ARC "26", "2 2 0 0"},
         {"EQUALITY caseIgnoreMatch ORDERING caseIgnoreOrderingMatch SUBSTR caseIgnoreSubstringsMatch SYNTAX " ARC "15",
          "1 1 1 1"},

@@ -273,6 +273,7 @@ TEST_F(SchemaChange, RefusalsOfSingleDefinitionsNameTheReason)
         {"erase rule ( 2.5.13.0 SYNTAX 5 )",
          "exc_invalid_state_t -32: matching rule '2.5.13.0' can not be deleted; its refcount is 4.  It should be 3"},
         {"replace syntax ( 7 )", "exc_ldap_rc_t(16) -27: syntax '7' does not exist"},
+        {"replace class ( person NAME 'person' )", "exc_ldap_rc_t(16) -27: object class 'person' does not exist"},
         {"replace type ( 7 NAME 'cn' )", "exc_ldap_rc_t(16) -27: attribute type '7' does not exist"},
         {"replace type ( 9.5 NAME ( 'spare' 'SN' ) SUP name )",
          "exc_invalid_input_t -30: attribute type: OID '9.5' and 'SN' do not refer to the same attribute type"},
@@ -332,6 +333,25 @@ TEST_F(SchemaChange, AReplacedDefinitionIsTheSameBodyWithTheNewText)
     EXPECT_STREQ(schema_.syntaxes[ARC "15"].v3_string(), "( " ARC "15 DESC 'new' )");
     EXPECT_TRUE(schema_.files.count("required") + schema_.files.count("extensions") == 2 &&
                 schema_.files["home"] == indicator::flushed);
+}
+
+// Walks over a map know a definition by the key that is its oid to the letter.
+TEST_F(SchemaChange, AReplacementMayWriteTheOidInAnotherCase)
+{
+    load_small(schema_);
+    const std::string kinds[][3] = {{"syntax", "( Mine-OID DESC 'x' )", "( mine-oid DESC 'y' )"},
+                                    {"rule", "( Mine-OID NAME 'r' SYNTAX 5 )", "( mine-oid NAME 'r' SYNTAX 5 )"},
+                                    {"type", "( Mine-OID NAME 't' SUP name )", "( mine-oid NAME 't' SUP cn )"},
+                                    {"class", "( Mine-OID NAME 'c' SUP top )", "( mine-oid NAME 'c' SUP top MAY cn )"}};
+    change(schema_, "insert syntax ( 5 )");
+    for (const auto& [kind, before, after] : kinds) {
+        change(schema_, "insert " + kind + " " + before);
+        change(schema_, "replace " + kind + " " + after);
+        EXPECT_NE(described(schema_).find(after.substr(0, 10)), std::string::npos) << kind;
+        ldcf_schema copy;
+        copy.copy(schema_);
+        EXPECT_EQ(described(copy), described(schema_)) << kind;
+    }
 }
 
 TEST_F(Schema, EveryRequiredDefinitionMustBeThere)
