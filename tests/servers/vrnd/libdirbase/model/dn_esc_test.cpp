@@ -502,19 +502,4 @@ TEST_F(DnNormalize, ValuesResolveToTheirBareText)
     EXPECT_EQ(canEscape('a') + needsEscape(' ') + needsEscape('#'), 0);
 }
 
-TEST_F(DnNormalize, ARecordMayHoldRdnsWithoutPairs)
-{
-    ldap_escDN* dn = new_ldap_escDN(1);
-    for (int i = 0; i < 100; ++i) {
-        ldapDN_elem33* const rdn = new_ldapDN_elem33();
-        if (i == 50) {
-            insert_ldapRDN_elem33(rdn, new_ldapRDN_elem33("a", "b", SC_CES), dn_order_given);
-        }
-        insert_ldapDN_elem33(dn, rdn);
-    }
-    EXPECT_STREQ(BuildDNString33(dn), "a=b");
-    EXPECT_STREQ(dn_upcase_esc(dn), "A=b");
-    free_ldap_escDN(&dn);
-}
-
 }  // namespace

@@ -19,8 +19,7 @@ class Filters : public Model {
 protected:
     Filters()
     {
-        ldcf_schema_g->parse_str("ldapSyntaxes { ( " ARC "6 ) ( " ARC "36 ) }\n"
-                                 "attributeTypes { ( 9.22 NAME 'bits' SYNTAX " ARC "6 )\n"
+        ldcf_schema_g->parse_str("attributeTypes { ( 9.22 NAME 'bits' SYNTAX " ARC "6 )\n"
                                  "( 9.23 NAME 'digits' SYNTAX " ARC "36 )\n"
                                  "( 9.20 NAME 'tel' EQUALITY telephoneNumberMatch SYNTAX " ARC "50 )\n"
                                  "( 9.21 NAME 'utc' SYNTAX " ARC "53 ) }\n"
