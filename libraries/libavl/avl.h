@@ -11,6 +11,7 @@
 #include "libraries/dirbase_export.h"
 
 // One node. Readers may walk the tree themselves; only the functions below change it.
+typedef struct avl_node avl_node;
 struct avl_node {
     void* data;           // the caller's object
     signed char balance;  // height of the right subtree less height of the left one: -1, 0 or +1
@@ -19,33 +20,33 @@ struct avl_node {
 };
 
 // Result codes. -1 also is what avl_dup_error makes of an insert.
-enum avl_result : int {
+enum avl_result DIRBASE_ENUM_INT {
     AVL_OK = 0,
     AVL_FAILURE = -1,
     AVL_NOMORE = -6,  // a traversal came to its end without being stopped
 };
 
 // The orders of avl_apply.
-enum avl_order : int {
+enum avl_order DIRBASE_ENUM_INT {
     AVL_PREORDER = 1,
     AVL_INORDER = 2,
     AVL_POSTORDER = 3,
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Compares the looked-for or new object with a stored one: negative, 0 or positive. The third argument is always 0,
 // except in avl_prefixapply, which passes the caller's own.
-using avl_cmp = int (*)(const void* wanted, const void* stored, int argument);
+typedef int (*avl_cmp)(const void* wanted, const void* stored, int argument);
 
 // Says what an insert gives that meets an equal object. The new one isn't stored, whatever the result.
-using avl_dup = int (*)(void* stored, void* added);
+typedef int (*avl_dup)(void* stored, void* added);
 
 // Visits an object with the caller's argument. The result is compared with the `stopflag` of the call.
-using avl_fn = int (*)(void* data, void* arg);
+typedef int (*avl_fn)(void* data, void* arg);
 
 // Releases an object.
-using avl_dfree = void (*)(void* data);
+typedef void (*avl_dfree)(void* data);
 
 // "AVL library version 1.0\n"
 DIRBASE_EXPORT extern const char avl_version[];
@@ -103,4 +104,4 @@ DIRBASE_EXPORT int avl_free(avl_node* root, avl_dfree dfree);
 DIRBASE_EXPORT void* avl_getfirst(avl_node* root);
 DIRBASE_EXPORT void* avl_getnext(void);
 
-}  // extern "C"
+DIRBASE_C_END

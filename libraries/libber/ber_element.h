@@ -11,32 +11,33 @@
 // changes hands is of malloc.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
+#include <stddef.h>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/berval.h"
 
 // One byte, class and form included. As wide as int, so that a plain number may stand where a format has a "t".
-using ber_tag_t = unsigned int;
+typedef unsigned int ber_tag_t;
 // Bytes.
-using ber_len_t = unsigned long;
+typedef unsigned long ber_len_t;
 
-// Results in place of a tag.
-constexpr ber_tag_t LBER_ERROR = 0xFFFFFFFFu;    // nothing readable is there
-constexpr ber_tag_t LBER_DEFAULT = 0xFFFFFFFEu;  // ber_first_element, ber_next_element: there is no further element
+// Results in place of a tag: nothing readable is there; and of ber_first_element and ber_next_element, there is no
+// further element.
+DIRBASE_CONSTANT(ber_tag_t, LBER_ERROR, 0xFFFFFFFFu);
+DIRBASE_CONSTANT(ber_tag_t, LBER_DEFAULT, 0xFFFFFFFEu);
 
 // Universal tags.
-constexpr ber_tag_t LBER_BOOLEAN = 0x01;
-constexpr ber_tag_t LBER_INTEGER = 0x02;
-constexpr ber_tag_t LBER_OCTETSTRING = 0x04;
-constexpr ber_tag_t LBER_NULL = 0x05;
-constexpr ber_tag_t LBER_ENUMERATED = 0x0A;
-constexpr ber_tag_t LBER_SEQUENCE = 0x30;
-constexpr ber_tag_t LBER_SET = 0x31;
+DIRBASE_NUMBER(ber_tag_t, LBER_BOOLEAN, 0x01);
+DIRBASE_NUMBER(ber_tag_t, LBER_INTEGER, 0x02);
+DIRBASE_NUMBER(ber_tag_t, LBER_OCTETSTRING, 0x04);
+DIRBASE_NUMBER(ber_tag_t, LBER_NULL, 0x05);
+DIRBASE_NUMBER(ber_tag_t, LBER_ENUMERATED, 0x0A);
+DIRBASE_NUMBER(ber_tag_t, LBER_SEQUENCE, 0x30);
+DIRBASE_NUMBER(ber_tag_t, LBER_SET, 0x31);
 
 // How many sequences and sets may be open at once, in an element that writes or within one ber_scanf.
-constexpr unsigned LBER_MAX_OPEN = 100;
+DIRBASE_NUMBER(unsigned, LBER_MAX_OPEN, 100);
 
 // The positions are there to be read:
 //
@@ -46,20 +47,21 @@ constexpr unsigned LBER_MAX_OPEN = 100;
 //   an element that reads    ber_ptr is the next byte to be read of those from ber_buf to ber_end. A caller that reads
 //                            the members of a construction may draw ber_end in to the construction's end, and put it
 //                            back afterwards: nothing is read beyond it.
+typedef struct BerElement BerElement;
 struct BerElement {
-    std::uint8_t ber_options;  // for the caller to set; the encoding is the same whatever it says
+    uint8_t ber_options;  // for the caller to set; the encoding is the same whatever it says
     char* ber_buf;
     char* ber_ptr;
     char* ber_end;
 
     // The rest is the library's own.
-    std::uint8_t ber_state;
-    ber_tag_t ber_tag;                      // what the next value is tagged with, 0 for its own tag
-    unsigned ber_open;                      // open sequences and sets
-    std::size_t ber_starts[LBER_MAX_OPEN];  // where the contents of each begin
+    uint8_t ber_state;
+    ber_tag_t ber_tag;                 // what the next value is tagged with, 0 for its own tag
+    unsigned ber_open;                 // open sequences and sets
+    size_t ber_starts[LBER_MAX_OPEN];  // where the contents of each begin
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- making and releasing -------------------------------------------------------------------------------------------
 
@@ -94,7 +96,7 @@ DIRBASE_EXPORT void ber_free(BerElement* ber, int free_buffer);
 //
 //   b        int                         BOOLEAN
 //   i  e     int                         INTEGER, ENUMERATED
-//   I        std::int64_t                INTEGER
+//   I        int64_t                     INTEGER
 //   s        const char*                 OCTET STRING of a zero-terminated text
 //   o        const char*, ber_len_t      OCTET STRING of so many bytes
 //   O        const berval*               OCTET STRING
@@ -126,8 +128,8 @@ DIRBASE_EXPORT int ber_flatten(const BerElement* ber, berval** value);
 // Reads values from the current position on into what the format's letters name.
 //
 //   b        int*                        0 or 1; any byte but 0 is true
-//   i  e     std::int32_t*               at most 4 bytes of INTEGER or ENUMERATED
-//   I        std::int64_t*               at most 8 bytes of them
+//   i  e     int32_t*                    at most 4 bytes of INTEGER or ENUMERATED
+//   I        int64_t*                    at most 8 bytes of them
 //   a        char**                      a new zero-terminated text; a zero byte in it is a failure
 //   A        char**                      the same, but null for the empty text
 //   s        char*, ber_len_t*           bytes into a buffer of so many, with a zero behind them, and their number; it
@@ -196,4 +198,4 @@ DIRBASE_EXPORT void fber_free(BerElement* ber, int free_buffer);
 // Returns the tag, or LBER_ERROR as ber_scanf does, with the position unmoved.
 DIRBASE_EXPORT ber_tag_t fber_get_string_len(BerElement* ber, char** text, ber_len_t* len);
 
-}  // extern "C"
+DIRBASE_C_END

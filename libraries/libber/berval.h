@@ -5,12 +5,13 @@
 
 #include "libraries/dirbase_export.h"
 
+typedef struct berval berval;
 struct berval {
     unsigned long bv_len;  // bytes, without a terminator
     char* bv_val;
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Returns a copy for the caller to release with ber_bvfree; null when `value` is null or memory ran out. The copy
 // always has bytes, followed by a zero byte that doesn't count; a value whose bv_val is null is copied as the empty
@@ -21,4 +22,4 @@ DIRBASE_EXPORT berval* ber_bvdup(const berval* value);
 DIRBASE_EXPORT void ber_bvfree(berval* value);
 DIRBASE_EXPORT void ber_bvecfree(berval** values);
 
-}  // extern "C"
+DIRBASE_C_END

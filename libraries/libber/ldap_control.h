@@ -4,18 +4,19 @@
 // different arrays may run at once.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/berval.h"
 
+typedef struct LDAPControl LDAPControl;
 struct LDAPControl {
     char* ldctl_oid;
     berval ldctl_value;  // bv_val is null when the control has no value
-    std::int32_t ldctl_iscritical;
+    int32_t ldctl_iscritical;
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Release a control with its text and value, and an array with its controls. Null does nothing.
 DIRBASE_EXPORT void ldap_control_free(LDAPControl* control);
@@ -50,4 +51,4 @@ DIRBASE_EXPORT int ldap_insert_control(LDAPControl* control, LDAPControl*** cont
 // Returns LDAP_SUCCESS, or LDAP_PARAM_ERROR for a null argument or a control that isn't in the array.
 DIRBASE_EXPORT int ldap_remove_control(LDAPControl* control, LDAPControl*** controls, int free_control);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -3,11 +3,11 @@
 
 #include "libraries/dirbase_export.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Returns a copy of the value of an environment variable for the caller to free() (an empty text for an empty value),
 // or null when the variable is not set, name is null, or memory ran out. Callers ask once and keep the answer: a
 // look-up that meets another thread's setenv is not safe, as with getenv itself.
 DIRBASE_EXPORT char* ldap_getenv(const char* name);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -1,7 +1,7 @@
 // Character conversion of the client library, on the platform's iconv and its language information.
 #pragma once
 
-#include <cstddef>
+#include <stddef.h>
 
 #include <iconv.h>
 
@@ -9,14 +9,15 @@
 
 // A conversion from one character set to another. Like the platform's descriptor it remembers how far a text of a
 // stateful character set has come, so threads that share one take turns.
+typedef struct ldap_iconv_t ldap_iconv_t;
 struct ldap_iconv_t {
     iconv_t descriptor;  // (iconv_t)-1 when the platform doesn't offer the conversion
 };
 
 // The one item of ldap_nl_langinfo: the name of the current locale's character set.
-constexpr int LDAP_NL_CODESET = 0x3D;
+DIRBASE_NUMBER(int, LDAP_NL_CODESET, 0x3D);
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Makes the conversion from the character set `from` to the character set `to`, by the names that iconv_open knows.
 //
@@ -31,8 +32,7 @@ DIRBASE_EXPORT ldap_iconv_t* ldap_iconv_open(const char* to, const char* from);
 // Returns the number of characters for which the target has only a substitute, 0 in general, or -1 with errno: EILSEQ
 // for input that is no text or that the target lacks, EINVAL for input that ends within a character, E2BIG for output
 // without room, EBADF without a conversion. All of these leave the positions at the place in question.
-DIRBASE_EXPORT int ldap_iconv(ldap_iconv_t* conversion, char** in, std::size_t* in_left, char** out,
-                              std::size_t* out_left);
+DIRBASE_EXPORT int ldap_iconv(ldap_iconv_t* conversion, char** in, size_t* in_left, char** out, size_t* out_left);
 
 // Closes a conversion, or does nothing for null. Returns 0, or -1 with errno when the platform refuses; the record is
 // gone either way.
@@ -42,4 +42,4 @@ DIRBASE_EXPORT int ldap_iconv_close(ldap_iconv_t* conversion);
 // setlocale and isn't to be changed. Null for any item but LDAP_NL_CODESET, and when the platform doesn't know.
 DIRBASE_EXPORT const char* ldap_nl_langinfo(int item);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -3,19 +3,23 @@
 // Modifications stand in null-terminated arrays, in chains through mod_next, or in both at once.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
+#include "libraries/dirbase_export.h"
 #include "libraries/libber/berval.h"
 
+DIRBASE_C_BEGIN
+
 // Values of mod_op.
-constexpr std::int32_t LDAP_MOD_ADD = 0;
-constexpr std::int32_t LDAP_MOD_DELETE = 1;
-constexpr std::int32_t LDAP_MOD_REPLACE = 2;
-constexpr std::int32_t LDAP_MOD_BVALUES = 0x80;  // a bit beside them: the values are bervals, not texts
+DIRBASE_NUMBER(int32_t, LDAP_MOD_ADD, 0);
+DIRBASE_NUMBER(int32_t, LDAP_MOD_DELETE, 1);
+DIRBASE_NUMBER(int32_t, LDAP_MOD_REPLACE, 2);
+DIRBASE_NUMBER(int32_t, LDAP_MOD_BVALUES, 0x80);  // a bit beside them: the values are bervals, not texts
 
 // All blocks are of malloc and belong to the record, but for the next record.
+typedef struct LDAPMod LDAPMod;
 struct LDAPMod {
-    std::int32_t mod_op;
+    int32_t mod_op;
     char* mod_type;
     union {
         berval** mod_bvalues;  // with LDAP_MOD_BVALUES: null-terminated, or null
@@ -23,3 +27,5 @@ struct LDAPMod {
     };
     LDAPMod* mod_next;
 };
+
+DIRBASE_C_END

@@ -1,7 +1,11 @@
 // Result codes: those of the protocol (RFC 4511 section 4.1.9) and those of the client interface, from 80 up.
 #pragma once
 
-enum ldap_result : int {
+#include "libraries/dirbase_export.h"
+
+DIRBASE_C_BEGIN
+
+enum ldap_result DIRBASE_ENUM_INT {
     LDAP_SUCCESS = 0,
     LDAP_OPERATIONS_ERROR = 1,
     LDAP_PROTOCOL_ERROR = 2,
@@ -56,3 +60,5 @@ enum ldap_result : int {
     LDAP_CONNECT_ERROR = 91,
     LDAP_NOT_SUPPORTED = 92,
 };
+
+DIRBASE_C_END

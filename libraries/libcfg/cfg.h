@@ -21,17 +21,17 @@
 // once.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/ldap_result.h"
 
-struct cfg_handle;   // a session
-struct cfg_message;  // the result of a search, and each of its entries
-struct cfg_ber;      // the position in an entry's attributes
+typedef struct cfg_handle cfg_handle;    // a session
+typedef struct cfg_message cfg_message;  // the result of a search, and each of its entries
+typedef struct cfg_ber cfg_ber;          // the position in an entry's attributes
 
 // Options of a session and their values.
-enum cfg_option : int {
+enum cfg_option DIRBASE_ENUM_INT {
     CFG_OPT_DUMP = 0x3e9,        // a flag: cfg_dump_exception writes what failed (off at first)
     CFG_OPT_DUMP_PLACE = 0x3ea,  // a flag: and where, by file and line (off at first)
     CFG_OPT_FILE = 0x3ed,        // const char*: path of the file. Setting it ends the session until the next bind.
@@ -39,17 +39,21 @@ enum cfg_option : int {
 };
 
 // The value that turns a flag on, as any pointer does; null turns it off.
-#define CFG_OPT_ON (reinterpret_cast<const void*>(std::uintptr_t{1}))
+#ifdef __cplusplus
+#define CFG_OPT_ON (reinterpret_cast<const void*>(uintptr_t{1}))
+#else
+#define CFG_OPT_ON ((const void*)(uintptr_t)1)
+#endif
 
-constexpr int CFG_AUTH_SIMPLE = 0x80;
+DIRBASE_NUMBER(int, CFG_AUTH_SIMPLE, 0x80);
 
-enum cfg_scope : int {
+enum cfg_scope DIRBASE_ENUM_INT {
     CFG_SCOPE_BASE = 0,  // the entry itself
     CFG_SCOPE_ONE = 1,   // the entries right below it
     CFG_SCOPE_SUB = 2,   // the entry and all below it
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- sessions -------------------------------------------------------------------------------------------------------
 
@@ -144,4 +148,4 @@ DIRBASE_EXPORT int cfg_get_errno(cfg_handle* cfg);
 DIRBASE_EXPORT void cfg_perror(cfg_handle* cfg, const char* step);
 DIRBASE_EXPORT void cfg_dump_exception(cfg_handle* cfg);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -3,12 +3,12 @@
 // Any number of threads may call these on texts and controls of their own.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/ldap_control.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Makes a control of what stands behind "control:".
 //
@@ -48,10 +48,10 @@ DIRBASE_EXPORT char* control2stringarray(LDAPControl** array);
 //           was.
 //
 // Returns their number, or -1 with a line in the debug log.
-DIRBASE_EXPORT std::int64_t localfromfile(const char* path, berval* target);
+DIRBASE_EXPORT int64_t localfromfile(const char* path, berval* target);
 
 // The same for a URL "file:///path" (RFC 8089), whose percent escapes are decoded in place. Any other gives -1, and so
 // does an escaped zero byte.
-DIRBASE_EXPORT std::int64_t localfromfile_url(char* url, berval* target);
+DIRBASE_EXPORT int64_t localfromfile_url(char* url, berval* target);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -11,24 +11,24 @@
 // Everything works on the caller's buffers alone, so any number of threads may call on buffers of their own.
 #pragma once
 
-#include <cstddef>
+#include <stddef.h>
 
 #include "libraries/dirbase_export.h"
 
 // Modes of the parser.
-constexpr int LDIF_MODE_ENTRY = -1;    // one space behind the mark is passed over, others belong to the value
-constexpr int LDIF_MODE_TOLERANT = 0;  // all spaces behind the mark are passed over
-constexpr int LDIF_MODE_TRIMMED = 1;   // white space at the end is cut off, too
+DIRBASE_NUMBER(int, LDIF_MODE_ENTRY, -1);    // one space behind the mark is passed over, others belong to the value
+DIRBASE_NUMBER(int, LDIF_MODE_TOLERANT, 0);  // all spaces behind the mark are passed over
+DIRBASE_NUMBER(int, LDIF_MODE_TRIMMED, 1);   // white space at the end is cut off, too
 
 // What the parser gives.
-constexpr int LDIF_LINE_OK = 0;
-constexpr int LDIF_LINE_BAD = -1;    // no ":", or bad Base64
-constexpr int LDIF_LINE_EMPTY = -2;  // no value
+DIRBASE_NUMBER(int, LDIF_LINE_OK, 0);
+DIRBASE_NUMBER(int, LDIF_LINE_BAD, -1);    // no ":", or bad Base64
+DIRBASE_NUMBER(int, LDIF_LINE_EMPTY, -2);  // no value
 
 // Marks the place of a fold, twice.
-constexpr char ldif_fold_marker = '\x01';
+DIRBASE_NUMBER(char, ldif_fold_marker, '\x01');
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- reading --------------------------------------------------------------------------------------------------------
 
@@ -56,9 +56,9 @@ DIRBASE_EXPORT char* str_remove_continued_line_marker(char* text, int* removed);
 //
 // Returns LDIF_LINE_OK; LDIF_LINE_EMPTY for a line without Base64 and without a value, with value the empty text; or
 // LDIF_LINE_BAD, with length 0 and value null (for bad Base64 there is a type). The line is changed in any case.
-DIRBASE_EXPORT int str_parse_line_v_or_bv(char* line, char** type, char** value, std::size_t* length, int mode,
-                                          int* is_url, int* is_base64);
-DIRBASE_EXPORT int str_parse_line(char* line, char** type, char** value, std::size_t* length, int mode, int* is_url);
+DIRBASE_EXPORT int str_parse_line_v_or_bv(char* line, char** type, char** value, size_t* length, int mode, int* is_url,
+                                          int* is_base64);
+DIRBASE_EXPORT int str_parse_line(char* line, char** type, char** value, size_t* length, int mode, int* is_url);
 
 // Decodes Base64 up to the first zero byte, line feed or "=".
 //
@@ -68,19 +68,19 @@ DIRBASE_EXPORT int str_parse_line(char* line, char** type, char** value, std::si
 // Returns 0; LDAP_DECODING_ERROR with length 0 when one of the first three characters of a group of four isn't of the
 // alphabet, or a group isn't whole (the fourth isn't tested: one outside the alphabet counts as "A"); -1 for a null
 // argument.
-DIRBASE_EXPORT int base64decode(char* target, const char* source, std::size_t* length);
+DIRBASE_EXPORT int base64decode(char* target, const char* source, size_t* length);
 
 // ---- writing --------------------------------------------------------------------------------------------------------
 
 // The room that one line takes at most, in bytes and without a terminator: with Base64, folds and the line feed.
-DIRBASE_EXPORT std::size_t ldif_line_room(std::size_t type_length, std::size_t value_length);
+DIRBASE_EXPORT size_t ldif_line_room(size_t type_length, size_t value_length);
 
 // Writes one line with its line feed, without a terminator.
 //
 //   out     the position, which moves behind the line; there must be room for ldif_line_room bytes
 //   type    up to its first ":"
 //   value   of `length` bytes; may be null when that is 0
-DIRBASE_EXPORT void put_type_and_value(char** out, const char* type, const char* value, std::size_t length);
+DIRBASE_EXPORT void put_type_and_value(char** out, const char* type, const char* value, size_t length);
 
 // The same for a value in two forms.
 //
@@ -90,12 +90,12 @@ DIRBASE_EXPORT void put_type_and_value(char** out, const char* type, const char*
 //           Base64, whatever its bytes. Else it goes in Base64 when it isn't safe; when it is, `value` is written, or
 //           without one `bvalue`.
 DIRBASE_EXPORT void put_type_and_value_or_bvalue(char** out, const char* type, const char* value, int flag,
-                                                 const char* bvalue, std::size_t length);
+                                                 const char* bvalue, size_t length);
 
 // The same into a new text, zero-terminated, for the caller to free(); null for a null type and without memory.
-DIRBASE_EXPORT char* ldif_type_and_value(const char* type, const char* value, std::size_t length);
+DIRBASE_EXPORT char* ldif_type_and_value(const char* type, const char* value, size_t length);
 DIRBASE_EXPORT char* ldif_type_and_value_or_bvalue(const char* type, const char* value, int flag, const char* bvalue,
-                                                   std::size_t length);
+                                                   size_t length);
 
 // Encodes the bytes from start up to stop.
 //
@@ -106,4 +106,4 @@ DIRBASE_EXPORT char* ldif_type_and_value_or_bvalue(const char* type, const char*
 // Returns 0, or -1 for a null argument.
 DIRBASE_EXPORT int base64encode(char** out, const char* start, const char* stop, int column);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -5,17 +5,19 @@
 // throws.
 #pragma once
 
+#include <stdbool.h>
+
 #include "libraries/dirbase_export.h"
 
 // The classes of debug texts.
-constexpr unsigned LDAP_DEBUG_TRACE = 0x00000001u;  // what happens, step by step
-constexpr unsigned LDAP_DEBUG_ERROR = 0xC8110000u;  // something failed
+DIRBASE_NUMBER(unsigned, LDAP_DEBUG_TRACE, 0x00000001u);    // what happens, step by step
+DIRBASE_CONSTANT(unsigned, LDAP_DEBUG_ERROR, 0xC8110000u);  // something failed
 
 // Takes debug texts in place of the built-in sinks. Called under the log's own lock; `text` is borrowed for the call
 // and is as the caller formatted it, line feed included.
-using debug_sink = void (*)(void* context, unsigned level, const char* text);
+typedef void (*debug_sink)(void* context, unsigned level, const char* text);
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // The current mask; 0, the value at start, turns the log off.
 DIRBASE_EXPORT unsigned read_ldap_debug(void);
@@ -31,7 +33,7 @@ DIRBASE_EXPORT void set_debug_sink(debug_sink sink, void* context);
 // failed open, after which the sink is as it was.
 DIRBASE_EXPORT int set_debug_file(const char* path);
 
-}  // extern "C"
+DIRBASE_C_END
 
 // A failure, told at the place that knows: debug_error("Error - dn_check: %s\n", text). By custom an error text begins
 // with "Error - " and ends with a line feed.

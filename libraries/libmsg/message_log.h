@@ -9,13 +9,13 @@
 // Every function here may be called from any thread at any time and never throws.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
+#include <stddef.h>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 
 // The severities that messages carry.
-enum message_severity : int {
+enum message_severity DIRBASE_ENUM_INT {
     MSG_INFORMATION = 1,
     MSG_WARNING = 2,
     MSG_ERROR = 4,
@@ -23,20 +23,23 @@ enum message_severity : int {
 };
 
 // Components, each with ids of its own.
-enum message_component : int {
+enum message_component DIRBASE_ENUM_INT {
     MSG_COMPONENT_SERVER = 0,
     MSG_COMPONENT_OPERATION = 2,
     MSG_COMPONENT_SCHEMA = 4,
     MSG_COMPONENT_RDBM = 7,
 };
 
-// One argument of a message. Texts are borrowed for the length of the call; a null text prints as nothing.
+// One argument of a message. Texts are borrowed for the length of the call; a null text prints as nothing. In C a
+// message goes without arguments, and a sink looks at the texts.
+typedef struct message_argument message_argument;
+#ifdef __cplusplus
 struct message_argument {
     enum class kind { text, integer, pointer };
 
     kind type = kind::text;
     const char* text = nullptr;
-    std::int64_t integer = 0;
+    int64_t integer = 0;
     const void* pointer = nullptr;
 
     message_argument(const char* value) : type(kind::text), text(value) {}
@@ -44,35 +47,41 @@ struct message_argument {
     message_argument(int value) : type(kind::integer), integer(value) {}
     message_argument(unsigned value) : type(kind::integer), integer(value) {}
     message_argument(long value) : type(kind::integer), integer(value) {}
-    message_argument(unsigned long value) : type(kind::integer), integer(static_cast<std::int64_t>(value)) {}
+    message_argument(unsigned long value) : type(kind::integer), integer(static_cast<int64_t>(value)) {}
     message_argument(const void* value) : type(kind::pointer), pointer(value) {}
 };
+#endif
 
 // A message as a sink sees it. Everything is borrowed for the length of the call.
+typedef struct message_record message_record;
 struct message_record {
     int component;
     int severity;
     int id;
     const message_argument* arguments;
-    std::size_t argument_count;
+    size_t argument_count;
     const char* text;  // the catalogue's text with the arguments in their places
     const char* line;  // the whole line with time, severity and id, without a line feed
 };
 
 // Takes messages in place of the built-in sinks. Called under the log's own lock, one message at a time, so it must not
-// log itself; `context` is the pointer given with it.
-using message_sink = void (*)(void* context, const message_record& record);
+// log itself; `context` is the pointer given with it. A reference and a pointer are passed alike.
+#ifdef __cplusplus
+typedef void (*message_sink)(void* context, const message_record& record);
+#else
+typedef void (*message_sink)(void* context, const message_record* record);
+#endif
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Writes one message to the current sink. `arguments` holds `count` arguments, or is null when count is 0.
 DIRBASE_EXPORT void PrintMessageArguments(int component, int severity, int id, const message_argument* arguments,
-                                          std::size_t count);
+                                          size_t count);
 
 // Renders the text of a message (no time, severity or id) into `buffer`, cut to at most size - 1 bytes and always
 // zero-terminated when size is above 0. A cut never splits a UTF-8 character. Returns the length of the uncut text.
-DIRBASE_EXPORT std::size_t getPrintedMessageArguments(char* buffer, std::size_t size, int component, int severity,
-                                                      int id, const message_argument* arguments, std::size_t count);
+DIRBASE_EXPORT size_t getPrintedMessageArguments(char* buffer, size_t size, int component, int severity, int id,
+                                                 const message_argument* arguments, size_t count);
 
 // Chooses where messages go: a function, or with a null function back to standard error, the sink at start.
 DIRBASE_EXPORT void set_message_sink(message_sink sink, void* context);
@@ -81,7 +90,9 @@ DIRBASE_EXPORT void set_message_sink(message_sink sink, void* context);
 // failed open, after which the sink is as it was.
 DIRBASE_EXPORT int set_message_file(const char* path);
 
-}  // extern "C"
+DIRBASE_C_END
+
+#ifdef __cplusplus
 
 // Writes the message (component, severity, id) with its arguments: texts, integers and pointers.
 template <typename... Arguments>
@@ -97,8 +108,7 @@ void PrintMessage(int component, int severity, int id, const Arguments&... argum
 
 // Renders the same message into a buffer; see getPrintedMessageArguments.
 template <typename... Arguments>
-std::size_t getPrintedMessage(char* buffer, std::size_t size, int component, int severity, int id,
-                              const Arguments&... arguments)
+size_t getPrintedMessage(char* buffer, size_t size, int component, int severity, int id, const Arguments&... arguments)
 {
     if constexpr (sizeof...(arguments) == 0) {
         return getPrintedMessageArguments(buffer, size, component, severity, id, nullptr, 0);
@@ -113,3 +123,5 @@ inline void message_no_memory()
 {
     PrintMessageArguments(MSG_COMPONENT_SERVER, MSG_SEVERE, 7, nullptr, 0);
 }
+
+#endif

@@ -21,7 +21,7 @@
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/berval.h"
 
-enum password_method : int {
+enum password_method DIRBASE_ENUM_INT {
     PWD_NONE = 1,
     PWD_SHA = 2,
     PWD_MD5 = 3,
@@ -31,7 +31,7 @@ enum password_method : int {
     PWD_AES192 = 134,
     PWD_AES128 = 135,
 };
-constexpr int PWD_TWO_WAY = 128;
+DIRBASE_NUMBER(int, PWD_TWO_WAY, 128);
 
 // The prefixes of the two-way methods.
 #define AES256_BRACED "{AES256}"
@@ -40,13 +40,14 @@ constexpr int PWD_TWO_WAY = 128;
 
 // What the two-way methods encrypt with. The key of each method is derived from it by HKDF with SHA-256 (RFC 5869), so
 // methods share no key. The key bytes must be random: a pass phrase is no key.
+typedef struct aes_key_data aes_key_data;
 struct aes_key_data {
     unsigned long key_length;  // bytes of `key` in use, 16 to 64; a record with any other length encrypts nothing
     unsigned char key[64];
     unsigned char salt[32];  // random, not secret, the same for as long as the key
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // The method of a stored value by its prefix; 1 for a value without one of the prefixes above. Only the prefix counts:
 // a damaged value still has its method, so it is never taken for a password in the clear.
@@ -104,4 +105,4 @@ DIRBASE_EXPORT int verify_password(const berval* password, const berval* stored,
 DIRBASE_EXPORT int verify_pwd_syntax(const char* password, const char* oldPassword, int policyOn, long minLength,
                                      long minAlpha, long minOther, long minDiff, long maxRepeat, int* state);
 
-}  // extern "C"
+DIRBASE_C_END

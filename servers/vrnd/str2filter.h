@@ -17,19 +17,19 @@
 // from any thread.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libdirbase/model/filter.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Parses a filter; null also for a null or empty text.
 DIRBASE_EXPORT Filter* str2filter(const char* text, int normalize);
 
 // Parses the elements of a list, which is what stands behind "&", "|" or "!", and makes the filter of this choice
 // (LDAP_FILTER_AND, LDAP_FILTER_OR, LDAP_FILTER_NOT).
-DIRBASE_EXPORT Filter* str2list(const char* text, std::uint64_t choice, int normalize);
+DIRBASE_EXPORT Filter* str2list(const char* text, uint64_t choice, int normalize);
 
 // Parses what stands between the parentheses of a filter without elements, such as "cn=a*".
 DIRBASE_EXPORT Filter* str2simple(const char* text, int normalize);
@@ -42,7 +42,7 @@ DIRBASE_EXPORT Filter* str2simple(const char* text, int normalize);
 //   syntax  syntax code of the attribute; with `normalize` the pieces are normalised by it as far as that can be done
 //
 // Returns LDAP_SUCCESS, or LDAP_NO_MEMORY with what was made before in the filter.
-DIRBASE_EXPORT int str2subvals(const char* text, Filter* filter, std::uint32_t syntax, int normalize);
+DIRBASE_EXPORT int str2subvals(const char* text, Filter* filter, uint32_t syntax, int normalize);
 
 // The parenthesis that closes the one which the text begins with, or null; of a text that doesn't begin with one its
 // first character. A backslash hides the character behind it.
@@ -53,4 +53,4 @@ DIRBASE_EXPORT const char* find_matching_paren(const char* text);
 // reader that goes by the terminator.
 DIRBASE_EXPORT char* unescape_value(const char* text);
 
-}  // extern "C"
+DIRBASE_C_END

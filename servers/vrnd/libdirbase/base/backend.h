@@ -5,27 +5,30 @@
 
 #include "libraries/dirbase_export.h"
 
-struct asyntaxinfo;
+typedef struct asyntaxinfo asyntaxinfo;
 
 // Texts and functions belong to whoever fills the record; a function pointer may be null.
+typedef struct Backend Backend;
 struct Backend {
-    char** be_suffix = nullptr;     // suffixes, each the upper text of dn_normalize_esc; ended by a null pointer
-    const char* be_type = nullptr;  // "rdbm" for the relational store, "proxy", "ldcf" for the schema store
-    Backend* be_next = nullptr;     // next on the list
+    // Suffixes, each the upper text of dn_normalize_esc; ended by a null pointer.
+    char** be_suffix DIRBASE_DEFAULT(nullptr);
+    // "rdbm" for the relational store, "proxy", "ldcf" for the schema store.
+    const char* be_type DIRBASE_DEFAULT(nullptr);
+    Backend* be_next DIRBASE_DEFAULT(nullptr);  // next on the list
 
     // What stands in front of the names of a relational store's tables, for example their owner, and the table that
     // holds entry-level attributes. The texts stay with the back end; null stands for none, and for LDAP_ENTRY.
-    const char* (*be_table_qualifier)(Backend* be) = nullptr;
-    const char* (*be_entry_table)(Backend* be) = nullptr;
+    const char* (*be_table_qualifier)(Backend* be) DIRBASE_DEFAULT(nullptr);
+    const char* (*be_entry_table)(Backend* be) DIRBASE_DEFAULT(nullptr);
 
     // May add to the record of an attribute type that has just been made, before anybody else sees it. It may run in
     // any look-up, before index_action and the four members about protection are filled, while other threads wait to
     // make theirs: it takes no lock that callers of look-ups hold, asks for no record of the same type, and raises
     // nothing. What it hangs on back_end_list is given to free() with the record.
-    void (*be_fill_attr_info)(asyntaxinfo* info) = nullptr;
+    void (*be_fill_attr_info)(asyntaxinfo* info) DIRBASE_DEFAULT(nullptr);
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Head of the list.
 DIRBASE_EXPORT extern Backend* g_backends;
@@ -36,4 +39,4 @@ DIRBASE_EXPORT extern int g_srvType;
 // The first back end of a list whose type is `type`, without regard to case; null when there is none or type is null.
 DIRBASE_EXPORT Backend* ldcf_api_get_backend(Backend* head, const char* type);
 
-}  // extern "C"
+DIRBASE_C_END

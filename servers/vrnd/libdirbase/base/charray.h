@@ -10,7 +10,7 @@
 
 #include "libraries/dirbase_export.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Appends `text` itself: the array owns it from then on.
 DIRBASE_EXPORT int charray_add(char*** array, char* text);
@@ -44,4 +44,4 @@ DIRBASE_EXPORT char** charray_dup(char** array);
 // of separators only gives an array without elements. Null when memory ran out, which is not told.
 DIRBASE_EXPORT char** str2charray(char* text, const char* separators);
 
-}  // extern "C"
+DIRBASE_C_END

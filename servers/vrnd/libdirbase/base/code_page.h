@@ -6,17 +6,17 @@
 // (which the first getline_and_xlate does too) and releasing may not meet a translation.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
-#include <cstdio>
+#include <stddef.h>
+#include <stdint.h>
+#include <stdio.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/ldap_iconv.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Whether lines that getline_and_xlate reads may need a translation; 0 at start, 1 on.
-DIRBASE_EXPORT extern std::int32_t cfg_xlate;
+DIRBASE_EXPORT extern int32_t cfg_xlate;
 
 // Name of the local code page; null until initIconvHandle has found it. The text belongs to this module.
 DIRBASE_EXPORT extern const char* local_codepage;
@@ -41,7 +41,7 @@ DIRBASE_EXPORT int initIconvHandle(void);
 //
 // Returns 0, or -1 at the end of the file or when it can't be read. While cfg_xlate is on, the first call makes sure
 // that the conversion to UTF-8 can be had: -1 after logging the reason when it can't, with nothing read.
-DIRBASE_EXPORT int getline_and_xlate(char* buffer, std::FILE* file);
+DIRBASE_EXPORT int getline_and_xlate(char* buffer, FILE* file);
 
 // Translate a zero-terminated text, terminator included. initIconvHandle comes first.
 //
@@ -51,11 +51,11 @@ DIRBASE_EXPORT int getline_and_xlate(char* buffer, std::FILE* file);
 //
 // Return 0; 90 (no memory); or -1 after logging it, when the input is not a text of its code page, holds a character
 // that the other one lacks, or grows to more than three times its size.
-DIRBASE_EXPORT int xlate_localcp_to_utf8(const char* input, char** output, std::size_t* length);
-DIRBASE_EXPORT int xlate_utf8_to_localcp(const char* input, char** output, std::size_t* length);
+DIRBASE_EXPORT int xlate_localcp_to_utf8(const char* input, char** output, size_t* length);
+DIRBASE_EXPORT int xlate_utf8_to_localcp(const char* input, char** output, size_t* length);
 
 // Closes the conversion to UTF-8 and forgets the local code page, so that the next initIconvHandle opens both
 // conversions afresh. The conversion to the local code page goes on working until that call, which closes it.
 DIRBASE_EXPORT void free_iconv_handle(void);
 
-}  // extern "C"
+DIRBASE_C_END

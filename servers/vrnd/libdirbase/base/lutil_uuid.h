@@ -11,11 +11,11 @@
 // Every function may be called from any thread at any time.
 #pragma once
 
-#include <cstddef>
+#include <stddef.h>
 
 #include "libraries/dirbase_export.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Fills a buffer with bytes that differ from call to call, thread to thread and process to process. They are made of
 // counters, addresses and the time by MD5 and can be guessed: never use them as a key, a salt or a password.
@@ -23,7 +23,7 @@ extern "C" {
 //   buffer  takes `size` bytes. What it holds before enters into the result, so it needs a value.
 //
 // Returns 0. A size of 0 does nothing.
-DIRBASE_EXPORT int lutil_entropy(unsigned char* buffer, std::size_t size);
+DIRBASE_EXPORT int lutil_entropy(unsigned char* buffer, size_t size);
 
 // Returns the 6 bytes of this process's node address. They are made at the first call and stay the same, and belong to
 // this module.
@@ -32,6 +32,6 @@ DIRBASE_EXPORT unsigned char* lutil_eaddr(void);
 // Writes a new identifier as text: 36 characters, such as 1b21dd21-4a3c-1006-8a5f-f03c91d2a6b4, and a terminator.
 //
 // Returns the length, 36, or 0 when `size` bytes can't hold text and terminator: the buffer is left alone.
-DIRBASE_EXPORT std::size_t lutil_uuidstr(char* buffer, std::size_t size);
+DIRBASE_EXPORT size_t lutil_uuidstr(char* buffer, size_t size);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -7,7 +7,7 @@
 #include "libraries/libber/berval.h"
 #include "libraries/libpwd/pwd_format.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // The server's key, used where a call passes none. Null at start; the front end sets it before other threads run and
 // keeps the record.
@@ -39,4 +39,4 @@ DIRBASE_EXPORT int value_encode_values(int method, berval** values, int freeOld,
 // Replaced texts are released; a value that can't be decoded stays as it was. Returns LDAP_SUCCESS.
 DIRBASE_EXPORT int value_decode_values(berval** values);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -5,18 +5,20 @@
 // back ends and the kind of server are in backend.h.
 #pragma once
 
-#include <cstdint>
+#include <stdbool.h>
+#include <stdint.h>
 
 #include <pthread.h>
 
 #include "libraries/dirbase_export.h"
 
-struct AdminPwdAttribs;
-struct AdminPwdPolicy;
-struct MasterSrvInfo;
-struct admin_group_member;
+typedef struct AdminPwdAttribs AdminPwdAttribs;
+typedef struct AdminPwdPolicy AdminPwdPolicy;
+typedef struct MasterSrvInfo MasterSrvInfo;
+typedef struct admin_group_member admin_group_member;
 
 // An object class as the server held it before there was a schema engine. Text and arrays are blocks of malloc.
+typedef struct objclass objclass;
 struct objclass {
     char* oc_name;
     char** oc_required;  // null-terminated
@@ -24,26 +26,26 @@ struct objclass {
     objclass* oc_next;
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- settings behind functions --------------------------------------------------------------------------------------
 
 // Whether language tags of attributes are honoured in filters; 0 at start.
-DIRBASE_EXPORT void set_g_language_tags_enabled(std::int32_t enabled);
-DIRBASE_EXPORT std::int32_t get_g_language_tags_enabled(void);
+DIRBASE_EXPORT void set_g_language_tags_enabled(int32_t enabled);
+DIRBASE_EXPORT int32_t get_g_language_tags_enabled(void);
 
 // How aliases are followed, as configured: 0 never, 1 in searching, 2 in finding the base, 3, the value at start,
 // always.
-DIRBASE_EXPORT void setAliasOptCfg(std::int32_t option);
-DIRBASE_EXPORT std::int32_t getAliasOptCfg(void);
+DIRBASE_EXPORT void setAliasOptCfg(int32_t option);
+DIRBASE_EXPORT int32_t getAliasOptCfg(void);
 
 // Sets it by word: "never", "search", "find" or "always" in any case. Returns 0, or 1 for any other word or null, which
 // changes nothing.
 DIRBASE_EXPORT int updateDerefOpt(const char* word);
 
 // The server-wide alias option of the front end; 1 at start.
-DIRBASE_EXPORT void setAliasOptGlobal(std::int32_t option);
-DIRBASE_EXPORT std::int32_t getAliasOptGlobal(void);
+DIRBASE_EXPORT void setAliasOptGlobal(int32_t option);
+DIRBASE_EXPORT int32_t getAliasOptGlobal(void);
 
 // Whether transactions are on; 0 at start. A change is told to the debug log.
 DIRBASE_EXPORT void set_transactionsEnabled(unsigned char enabled);
@@ -51,8 +53,8 @@ DIRBASE_EXPORT unsigned char get_transactionsEnabled(void);
 
 // How long a write to a client may block; 120 at start, in the unit of the front end. Any thread, at any time: setting
 // is serialised, reading takes no lock.
-DIRBASE_EXPORT void set_write_timeout(std::int64_t timeout);
-DIRBASE_EXPORT std::int64_t get_write_timeout(void);
+DIRBASE_EXPORT void set_write_timeout(int64_t timeout);
+DIRBASE_EXPORT int64_t get_write_timeout(void);
 
 // Whether anonymous binds are accepted. Any thread, at any time: both take a lock. The byte itself is for the single
 // thread of start-up.
@@ -65,8 +67,8 @@ DIRBASE_EXPORT void initDOSLocks(void);
 
 // ---- settings for all to read ---------------------------------------------------------------------------------------
 
-DIRBASE_EXPORT extern std::int32_t g_InternalSearchLimit;  // -1 at start
-DIRBASE_EXPORT extern pthread_key_t svrthread_key;         // the thread's server record: its first word is the back end
+DIRBASE_EXPORT extern int32_t g_InternalSearchLimit;  // -1 at start
+DIRBASE_EXPORT extern pthread_key_t svrthread_key;    // the thread's server record: its first word is the back end
 DIRBASE_EXPORT extern void* g_be_changelog;
 DIRBASE_EXPORT extern void* g_cfgKeyData;
 DIRBASE_EXPORT extern void* g_ptaBind;
@@ -88,23 +90,23 @@ DIRBASE_EXPORT extern const char* g_attrPartitionHash;
 DIRBASE_EXPORT extern unsigned char g_repl_conflict_res_for_groups;  // 1 at start
 DIRBASE_EXPORT extern unsigned char g_replRestrictedAccess;
 DIRBASE_EXPORT extern unsigned char g_StopServer;
-DIRBASE_EXPORT extern std::int32_t g_server_state;
-DIRBASE_EXPORT extern std::int32_t g_safe_mode;
-DIRBASE_EXPORT extern std::int32_t g_port;
-DIRBASE_EXPORT extern std::int32_t g_rootUID;
-DIRBASE_EXPORT extern std::int32_t g_serverInstanceUID;
-DIRBASE_EXPORT extern std::int32_t g_serverInstanceGID;
+DIRBASE_EXPORT extern int32_t g_server_state;
+DIRBASE_EXPORT extern int32_t g_safe_mode;
+DIRBASE_EXPORT extern int32_t g_port;
+DIRBASE_EXPORT extern int32_t g_rootUID;
+DIRBASE_EXPORT extern int32_t g_serverInstanceUID;
+DIRBASE_EXPORT extern int32_t g_serverInstanceGID;
 
 // What is audited, as a whole and for the performance of each kind of operation.
-DIRBASE_EXPORT extern std::int32_t g_audit_options;
-DIRBASE_EXPORT extern std::int32_t g_au_perf_add_op;
-DIRBASE_EXPORT extern std::int32_t g_au_perf_bind_op;
-DIRBASE_EXPORT extern std::int32_t g_au_perf_compare_op;
-DIRBASE_EXPORT extern std::int32_t g_au_perf_delete_op;
-DIRBASE_EXPORT extern std::int32_t g_au_perf_moddn_op;
-DIRBASE_EXPORT extern std::int32_t g_au_perf_modify_op;
-DIRBASE_EXPORT extern std::int32_t g_au_perf_search_op;
-DIRBASE_EXPORT extern std::int32_t g_au_perf_unbind_op;
+DIRBASE_EXPORT extern int32_t g_audit_options;
+DIRBASE_EXPORT extern int32_t g_au_perf_add_op;
+DIRBASE_EXPORT extern int32_t g_au_perf_bind_op;
+DIRBASE_EXPORT extern int32_t g_au_perf_compare_op;
+DIRBASE_EXPORT extern int32_t g_au_perf_delete_op;
+DIRBASE_EXPORT extern int32_t g_au_perf_moddn_op;
+DIRBASE_EXPORT extern int32_t g_au_perf_modify_op;
+DIRBASE_EXPORT extern int32_t g_au_perf_search_op;
+DIRBASE_EXPORT extern int32_t g_au_perf_unbind_op;
 
 DIRBASE_EXPORT extern char* g_digest_attr;
 DIRBASE_EXPORT extern char* g_digest_realm;
@@ -112,7 +114,7 @@ DIRBASE_EXPORT extern char* g_digest_admin_user;
 
 DIRBASE_EXPORT extern MasterSrvInfo* g_masterSrvInfoList;  // the supplier servers
 DIRBASE_EXPORT extern char** g_ipAddressList;              // addresses to listen on, and their number
-DIRBASE_EXPORT extern std::int32_t g_ipAddressListSize;
+DIRBASE_EXPORT extern int32_t g_ipAddressListSize;
 DIRBASE_EXPORT extern pthread_mutex_t g_shutdown_mutex;
 
 // ---- figures of the monitor -----------------------------------------------------------------------------------------
@@ -168,6 +170,6 @@ DIRBASE_EXPORT char* vrn_strerror(int error);
 DIRBASE_EXPORT int ascii_strcmp(const char* a, const char* b);
 
 // The first 32-bit word of a thread's identity, for log lines.
-DIRBASE_EXPORT std::uint32_t vrnd_pthread_getthreadid(const pthread_t* thread);
+DIRBASE_EXPORT uint32_t vrnd_pthread_getthreadid(const pthread_t* thread);
 
-}  // extern "C"
+DIRBASE_C_END

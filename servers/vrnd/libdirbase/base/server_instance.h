@@ -4,9 +4,11 @@
 // and knows nothing.
 #pragma once
 
+#include <stdbool.h>
+
 #include "libraries/dirbase_export.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // What paths are made of: <directory>instance-<name>/xanvrnd.conf.
 DIRBASE_EXPORT extern const char* const dirSeparator;
@@ -33,4 +35,4 @@ DIRBASE_EXPORT char** getServerInstanceList(void);
 DIRBASE_EXPORT char* getNewInstanceName(void);
 DIRBASE_EXPORT char* getRegConfigFileInstance(const char* configFile);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -13,22 +13,23 @@
 // Everything here may be used from any thread.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 
 // A run of characters with mappings.
+typedef struct UniCaseRange UniCaseRange;
 struct UniCaseRange {
-    std::int32_t first;        // first character of the run; 0 ends a list of ranges
-    std::int32_t last;         // last character of the run
-    const std::int8_t* table;  // [character - first]: mapped character minus character, 0 without a mapping
+    int32_t first;        // first character of the run; 0 ends a list of ranges
+    int32_t last;         // last character of the run
+    const int8_t* table;  // [character - first]: mapped character minus character, 0 without a mapping
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // The mappings of U+0000 to U+01FF: mapped character minus character, 0 without a mapping.
-DIRBASE_EXPORT extern const std::int8_t UniUpperTable[512];
-DIRBASE_EXPORT extern const std::int8_t UniLowerTable[512];
+DIRBASE_EXPORT extern const int8_t UniUpperTable[512];
+DIRBASE_EXPORT extern const int8_t UniLowerTable[512];
 
 // The mappings from U+0200: five ranges in rising order, and one whose first character is 0.
 DIRBASE_EXPORT extern const UniCaseRange UniUpperRange[6];
@@ -36,11 +37,11 @@ DIRBASE_EXPORT extern const UniCaseRange UniLowerRange[6];
 
 // The upper case, or the lower case, of a character. What has no mapping comes back as it is, numbers that are no
 // character (negative ones, those above U+FFFF) included.
-DIRBASE_EXPORT std::int32_t UniToupper(std::int32_t character);
-DIRBASE_EXPORT std::int32_t UniTolower(std::int32_t character);
+DIRBASE_EXPORT int32_t UniToupper(int32_t character);
+DIRBASE_EXPORT int32_t UniTolower(int32_t character);
 
 // Map a zero-terminated array of characters in place, and return it. Null is returned for null.
-DIRBASE_EXPORT std::int32_t* UniStrupr(std::int32_t* text);
-DIRBASE_EXPORT std::int32_t* UniStrlwr(std::int32_t* text);
+DIRBASE_EXPORT int32_t* UniStrupr(int32_t* text);
+DIRBASE_EXPORT int32_t* UniStrlwr(int32_t* text);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -15,7 +15,7 @@
 // attribute, and a string like one that isn't there.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/ber_element.h"
@@ -23,7 +23,7 @@
 #include "servers/vrnd/libdirbase/model/filter.h"
 #include "servers/vrnd/libdirbase/schema/asyntaxinfo.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Reads the filter at the position of an element.
 //
@@ -53,8 +53,8 @@ DIRBASE_EXPORT int get_filter(const Connection* conn, BerElement* ber, Filter** 
 //   text    takes their texts joined; null when there is none
 //   choice  LDAP_FILTER_AND: with an undefined member there is no list; LDAP_FILTER_OR: undefined members are left out;
 //           with any other choice they are a failure, LDAP_OPERATIONS_ERROR
-DIRBASE_EXPORT int get_filter_list(const Connection* conn, BerElement* ber, Filter** list, char** text,
-                                   std::uint64_t choice, char** error_text);
+DIRBASE_EXPORT int get_filter_list(const Connection* conn, BerElement* ber, Filter** list, char** text, uint64_t choice,
+                                   char** error_text);
 
 // Reads the substring filter at the position into a record, whose f_choice and f_sub are set; what they held isn't
 // looked at.
@@ -70,7 +70,7 @@ DIRBASE_EXPORT int get_substring_filter(const Connection* conn, BerElement* ber,
 // Reads the assertion at the position for a filter of this choice. The attribute "debug" takes any value, as it stands.
 //
 // Returns as get_substring_filter. The assertion is zeroed on failure, and else for ava_free.
-DIRBASE_EXPORT int get_ava_for_filter(const Connection* conn, BerElement* ber, ava* assertion, std::uint64_t choice,
+DIRBASE_EXPORT int get_ava_for_filter(const Connection* conn, BerElement* ber, ava* assertion, uint64_t choice,
                                       char** error_text);
 
 // Reads the assertion of a compare request: a value that its syntax refuses is taken as it is. Returns LDAP_SUCCESS, or
@@ -87,7 +87,7 @@ DIRBASE_EXPORT int get_ava(BerElement* ber, ava* assertion);
 // but presence and equality of one encrypted two ways, and an attribute that isn't to be matched;
 // LDAP_CONFIDENTIALITY_REQUIRED for an attribute that needs a secure connection, on one that is neither bound, nor
 // secure, nor audited; LDAP_SUCCESS for any other choice than those of filter.h, extensible match among them.
-DIRBASE_EXPORT int filter_check_attr_constraints(const Connection* conn, std::uint64_t choice, const asyntaxinfo* info,
+DIRBASE_EXPORT int filter_check_attr_constraints(const Connection* conn, uint64_t choice, const asyntaxinfo* info,
                                                  char** error_text);
 
 // The text of a value in a filter: "(", ")", "*" and backslash as a backslash and two hexadecimal digits, all other
@@ -99,4 +99,4 @@ DIRBASE_EXPORT int filter_check_attr_constraints(const Connection* conn, std::ui
 // Returns LDAP_SUCCESS or LDAP_NO_MEMORY.
 DIRBASE_EXPORT int expand_filter_value(const char* value, unsigned long length, char** text);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -4,13 +4,14 @@
 #include "libraries/dirbase_export.h"
 
 // A password attribute; the table's last row is zero.
+typedef struct password_type password_type;
 struct password_type {
     int number;
     const char* name;
     int length;  // of the name
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 DIRBASE_EXPORT extern const password_type g_password_types[3];
 
@@ -23,4 +24,4 @@ DIRBASE_EXPORT int convertPWEncryptionMethod(const char* text, int* out);
 // decides for the life of the process.
 DIRBASE_EXPORT int using_openldap_pwdpolicy_response(void);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -9,22 +9,25 @@
 // and returns without the lock; that happens only to a lock that is damaged or was never initialised.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include <pthread.h>
 
 #include "libraries/dirbase_export.h"
 
+typedef struct rdbm_lock_t rdbm_lock_t;
 struct rdbm_lock_t {
     pthread_mutex_t mutex;  // guards `count` and `writer`
-    std::int16_t count;     // readers inside; -1 while a writer is inside; 0 free
-    std::uint8_t writer;    // 1 while a writer is inside or first in line
+    int16_t count;          // readers inside; -1 while a writer is inside; 0 free
+    uint8_t writer;         // 1 while a writer is inside or first in line
     pthread_cond_t cond;    // every waiter waits here
 };
 
+#ifdef __cplusplus
 static_assert(sizeof(rdbm_lock_t::count) == 2, "the number of readers is a signed 16-bit word");
+#endif
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Makes `lock` free. `name` tells the lock in the caller's code and isn't kept.
 DIRBASE_EXPORT void rdbm_lock_init(rdbm_lock_t* lock, const char* name);
@@ -48,4 +51,4 @@ DIRBASE_EXPORT void _rdbm_rd_unlock(rdbm_lock_t* lock);
 DIRBASE_EXPORT void _rdbm_wr_unlock(rdbm_lock_t* lock);
 DIRBASE_EXPORT void _rdbm_unlock(rdbm_lock_t* lock);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -26,8 +26,7 @@ struct sorted_neighbours {
     Attribute* above;
 };
 
-class attr_index {
-public:
+struct attr_index {
     // An index of all records of an entry, to be kept in e_index; null without memory.
     static attr_index* build(const Entry& entry) noexcept;
 

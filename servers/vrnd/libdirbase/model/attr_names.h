@@ -4,19 +4,21 @@
 // read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g). Everything else may be called from any thread.
 #pragma once
 
-#include <cstdint>
+#include <stdbool.h>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libavl/avl.h"
 #include "servers/vrnd/libdirbase/schema/asyntaxinfo.h"
 
 // An attribute by its schema record, or where the schema doesn't know it (null) by its name.
+typedef struct attr_type_key attr_type_key;
 struct attr_type_key {
     asyntaxinfo* info;
     const char* name;
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- texts, changed in place; the result is the text ----------------------------------------------------------------
 
@@ -70,13 +72,13 @@ DIRBASE_EXPORT int attr_syntax_names_cmp(const char* name, const asyntaxinfo* in
 // ---- syntaxes, looked up --------------------------------------------------------------------------------------------
 
 // The syntax code of an attribute; SC_CIS when the schema doesn't know it.
-DIRBASE_EXPORT std::uint32_t attr_syntax(const char* name);
+DIRBASE_EXPORT uint32_t attr_syntax(const char* name);
 
 // The same for a filter: 0 for a name that it can't use, which is one that the schema doesn't know, or that has a
 // language tag while these are switched off (get_g_language_tags_enabled). `info`, unless null, takes the record, null
 // with 0.
-DIRBASE_EXPORT std::uint32_t attr_syntax_for_filter(const char* name);
-DIRBASE_EXPORT std::uint32_t attr_syntax_for_filter_return_asi(const char* name, asyntaxinfo** info);
+DIRBASE_EXPORT uint32_t attr_syntax_for_filter(const char* name);
+DIRBASE_EXPORT uint32_t attr_syntax_for_filter_return_asi(const char* name, asyntaxinfo** info);
 
 // A tree of records for whoever wants one; the library puts nothing into it.
 DIRBASE_EXPORT extern avl_node* attr_syntaxes;
@@ -86,4 +88,4 @@ DIRBASE_EXPORT avl_node* attr_syntaxes_get(void);
 // turns that off by "FALSE" or "NO" in any case.
 DIRBASE_EXPORT int convertAttrLowerCase(void);
 
-}  // extern "C"
+DIRBASE_C_END

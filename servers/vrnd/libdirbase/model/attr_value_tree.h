@@ -13,13 +13,13 @@
 // attribute's schema record: the caller holds the read side of the schema lock.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/value_compare.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Makes a node of a value.
 //
@@ -29,8 +29,8 @@ extern "C" {
 //
 // Returns LDAP_SUCCESS; LDAP_INVALID_SYNTAX for an unknown code or a text that isn't of its syntax; another failure of
 // value_normalize_berval or str2syntaxvalue; LDAP_NO_MEMORY, also for a text of 2 GB and more.
-DIRBASE_EXPORT int create_normalized_berval_in_attrvalsNorm(AttrvalsNorm** node, const berval* value,
-                                                            std::uint32_t syntax, int normalize);
+DIRBASE_EXPORT int create_normalized_berval_in_attrvalsNorm(AttrvalsNorm** node, const berval* value, uint32_t syntax,
+                                                            int normalize);
 
 // Releases a node; null does nothing.
 DIRBASE_EXPORT void free_AttrvalsNorm(AttrvalsNorm* node);
@@ -43,17 +43,21 @@ DIRBASE_EXPORT void free_AttrvalsNorm(AttrvalsNorm* node);
 //
 // The value "default" of `ownersource` and `aclsource` is found as it is stored, without being normalised
 // (value_add.h).
-DIRBASE_EXPORT int value_find(const Attribute* attr, const berval* value, std::uint32_t syntax, int normalize);
+DIRBASE_EXPORT int value_find(const Attribute* attr, const berval* value, uint32_t syntax, int normalize);
 
 // Whether a raw text of that many bytes is one of the values without regard to ASCII case: 0 when it is, else 1. Looks
 // at one value after the other, so it is for lists that the caller thinks short.
-DIRBASE_EXPORT int value_find_short_list(const Attribute* attr, const char* text, std::int64_t length);
+DIRBASE_EXPORT int value_find_short_list(const Attribute* attr, const char* text, int64_t length);
 
 // Takes a value of the attribute's syntax, which is normalised first, out of the tree; the value array is the caller's
 // to change. Returns LDAP_SUCCESS, also without a tree and when the value isn't in it, or the failure to make a node.
-DIRBASE_EXPORT int delete_valuetree_value(Attribute* attr, const berval* value, std::uint32_t syntax);
+DIRBASE_EXPORT int delete_valuetree_value(Attribute* attr, const berval* value, uint32_t syntax);
 
-}  // extern "C"
+DIRBASE_C_END
+
+#ifdef __cplusplus
 
 // Whether a value is the word "default" for one of the attributes that take it in place of a DN.
 bool is_default_source(const Attribute& attr, const berval& value);
+
+#endif

@@ -10,7 +10,7 @@
 // the name looked up.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libavl/avl.h"
@@ -19,15 +19,16 @@
 #include "servers/vrnd/libdirbase/schema/asyntaxinfo.h"
 
 // One version of an attribute. Blocks of malloc, owned by the record except where it says otherwise.
+typedef struct Attribute Attribute;
 struct Attribute {
-    char* a_type;           // the name as stored, with its language tag; in the same block as the record
-    berval** a_vals;        // null-terminated; null until the first value
-    std::int32_t a_syntax;  // syntax code; SC_CIS when the schema doesn't know the attribute
-    Attribute* a_next;      // in order of arrival
+    char* a_type;       // the name as stored, with its language tag; in the same block as the record
+    berval** a_vals;    // null-terminated; null until the first value
+    int32_t a_syntax;   // syntax code; SC_CIS when the schema doesn't know the attribute
+    Attribute* a_next;  // in order of arrival
     Attribute* a_prev;
     avl_node* a_tree;  // the value tree (attr_value_tree.h), or null; may be dropped at any time
-    std::int64_t a_numvals;
-    std::int64_t a_maxvals;    // room of a_vals, in pointers
+    int64_t a_numvals;
+    int64_t a_maxvals;         // room of a_vals, in pointers
     asyntaxinfo* a_info;       // schema record, or null; the schema's
     Attribute* a_sorted_next;  // towards the larger names
     Attribute* a_sorted_prev;  // towards the smaller names
@@ -35,9 +36,9 @@ struct Attribute {
 };
 
 // What flatattr_apply calls. Not 0 for a failure, which ends the walk.
-using flatattr_function = int (*)(Attribute* attr, void* argument);
+typedef int (*flatattr_function)(Attribute* attr, void* argument);
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- adding ---------------------------------------------------------------------------------------------------------
 
@@ -69,8 +70,8 @@ DIRBASE_EXPORT int attr_merge(Entry* entry, const char* name, berval** values, i
 //   attr       *attr is null at the first call and the record from then on.
 //
 // Returns LDAP_SUCCESS, LDAP_INVALID_SYNTAX for a tag that is too long, LDAP_NO_MEMORY, LDAP_OTHER for null arguments.
-DIRBASE_EXPORT int attr_merge_fast(Entry* entry, const char* name, berval** values, std::int64_t old_count,
-                                   std::int64_t added, std::int64_t* capacity, Attribute** attr, asyntaxinfo* info);
+DIRBASE_EXPORT int attr_merge_fast(Entry* entry, const char* name, berval** values, int64_t old_count, int64_t added,
+                                   int64_t* capacity, Attribute** attr, asyntaxinfo* info);
 
 // Adds one text value (null counts as the empty one) as attr_merge does with (0, 0), when the name is selected. Returns
 // LDAP_SUCCESS when it isn't.
@@ -159,4 +160,4 @@ DIRBASE_EXPORT int attr_decode_and_normalize_values(Attribute* attr);
 // tree, without an attribute, and when memory ran out.
 DIRBASE_EXPORT berval** attr_get_normvals_array(const Attribute* attr);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -3,9 +3,9 @@
 
 #include "libraries/dirbase_export.h"
 
-struct Backend;
+typedef struct Backend Backend;
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Whether a DN is one of the suffixes of a back end: 1 or 0, and LDAP_NO_MEMORY when it couldn't be normalised for want
 // of memory. A null or empty DN is none, nor is one that isn't well-formed.
@@ -14,4 +14,4 @@ extern "C" {
 //               the read side of the schema lock
 DIRBASE_EXPORT int be_issuffix_internal(Backend* be, const char* dn, int normalised);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -6,16 +6,16 @@
 // carriage return. Any thread may call them.
 #pragma once
 
-#include <cstddef>
+#include <stddef.h>
 
 #include "libraries/dirbase_export.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Check a text. `offset` may be null and else takes, on failure, the offset of the character at fault (0 for a null
 // text). Return LDAP_SUCCESS, also for the empty text, or LDAP_INVALID_DN_SYNTAX with a line in the debug log, also for
 // a null text.
-DIRBASE_EXPORT int dn_check(const char* dn, std::size_t* offset);
-DIRBASE_EXPORT int rdn_check(const char* rdn, std::size_t* offset);
+DIRBASE_EXPORT int dn_check(const char* dn, size_t* offset);
+DIRBASE_EXPORT int rdn_check(const char* rdn, size_t* offset);
 
-}  // extern "C"
+DIRBASE_C_END

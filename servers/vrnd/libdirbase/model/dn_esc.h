@@ -30,15 +30,15 @@
 // characters that have to be escaped everywhere in a value.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
+#include <stddef.h>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 
-struct asyntaxinfo;
+typedef struct asyntaxinfo asyntaxinfo;
 
 // What may be wrong with a DN.
-enum dn_error : int {
+enum dn_error DIRBASE_ENUM_INT {
     DN_ERR_EMPTY_VALUE = -1,  // empty value at the end of the text
     DN_ERR_SYNTAX = 1,        // bad character in or behind a type, end of the text inside a type, malformed value
     DN_ERR_ESCAPE = 2,        // backslash followed by what can't be escaped
@@ -55,48 +55,52 @@ enum dn_error : int {
 };
 
 // The longest DN that is parsed, in bytes; blanks in front of it count.
-constexpr std::size_t dn_longest = 2000;
+DIRBASE_NUMBER(size_t, dn_longest, 2000);
 
 // How an RDN takes its pairs.
-constexpr int dn_order_given = 98;
-constexpr int dn_order_sorted = 99;
+DIRBASE_NUMBER(int, dn_order_given, 98);
+DIRBASE_NUMBER(int, dn_order_sorted, 99);
 
 // One pair of type and value.
+typedef struct ldapRDN_struct33 ldapRDN_struct33;
 struct ldapRDN_struct33 {
     char* type;
-    char* value;          // bare: quotes and escapes resolved, any byte but 0
-    std::int64_t syntax;  // syntax code (base/syntax_codes.h)
+    char* value;     // bare: quotes and escapes resolved, any byte but 0
+    int64_t syntax;  // syntax code (base/syntax_codes.h)
 
-    std::size_t type_length;
-    std::size_t value_length;
-    std::size_t escaped_length;  // of the value as the canonical text has it
+    size_t type_length;
+    size_t value_length;
+    size_t escaped_length;  // of the value as the canonical text has it
 };
 
 // A pair in the chain of its RDN. This link, the record behind it and both texts are one block.
+typedef struct ldapRDN_elem33 ldapRDN_elem33;
 struct ldapRDN_elem33 {
     ldapRDN_struct33* rdn;
     ldapRDN_elem33* next;
 };
 
 // One RDN.
+typedef struct ldapDN_elem33 ldapDN_elem33;
 struct ldapDN_elem33 {
     ldapRDN_elem33* pairs;
-    std::int64_t count;         // of pairs
-    std::uint64_t syntax_mask;  // the syntax codes of its attributes and-ed, from 1: 1 while all have SC_CIS, else 0
-    std::uint32_t encrypted;    // 1 when one of its attributes is stored encrypted
+    int64_t count;         // of pairs
+    uint64_t syntax_mask;  // the syntax codes of its attributes and-ed, from 1: 1 while all have SC_CIS, else 0
+    uint32_t encrypted;    // 1 when one of its attributes is stored encrypted
     ldapDN_elem33* next;
 
     ldapRDN_elem33* last;  // pair
 };
 
 // A parsed DN.
+typedef struct ldap_escDN ldap_escDN;
 struct ldap_escDN {
-    ldapDN_elem33* rdns;            // the most specific one first
-    std::int64_t count;             // of RDNs
-    std::int64_t length;            // of the input; of the canonical text once that is built
-    std::uint64_t all_case_ignore;  // bit 0: every attribute has SC_CIS
-    std::int64_t internal_error;    // 0 or one of dn_error
-    std::int32_t result;            // the LDAP result that getRC made of it
+    ldapDN_elem33* rdns;       // the most specific one first
+    int64_t count;             // of RDNs
+    int64_t length;            // of the input; of the canonical text once that is built
+    uint64_t all_case_ignore;  // bit 0: every attribute has SC_CIS
+    int64_t internal_error;    // 0 or one of dn_error
+    int32_t result;            // the LDAP result that getRC made of it
     char* scratch;    // the cleaned DN: values as in the canonical text, types and order of pairs as written (with the
                       // schema, numeric types and those with "oid." in front by their first names); in the same
                       // block as the record. Empty in a record that no parse made.
@@ -108,13 +112,14 @@ struct ldap_escDN {
 
 // The working text of a parse, to which parse_escRDN appends. Where a name from the schema needs more room the record
 // moves into a larger block: hold no other pointer to it meanwhile.
+typedef struct ldap_escDN_work ldap_escDN_work;
 struct ldap_escDN_work {
-    ldap_escDN** dn;     // the record with the work area
-    std::size_t length;  // bytes written
-    std::size_t room;    // size of the work area
+    ldap_escDN** dn;  // the record with the work area
+    size_t length;    // bytes written
+    size_t room;      // size of the work area
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- parsing ------------------------------------------------------------------------------------------------------
 
@@ -225,9 +230,9 @@ DIRBASE_EXPORT int replace_DN(char** dn, int release);
 
 // New records for their free_ functions; null without memory. A record of a DN comes with a work area of `work` bytes,
 // 1 at least.
-DIRBASE_EXPORT ldap_escDN* new_ldap_escDN(std::size_t work);
+DIRBASE_EXPORT ldap_escDN* new_ldap_escDN(size_t work);
 DIRBASE_EXPORT ldapDN_elem33* new_ldapDN_elem33(void);
-DIRBASE_EXPORT ldapRDN_elem33* new_ldapRDN_elem33(const char* type, const char* value, std::int64_t syntax);
+DIRBASE_EXPORT ldapRDN_elem33* new_ldapRDN_elem33(const char* type, const char* value, int64_t syntax);
 
 // Release a record and all below it, not what is linked behind it. A null pointer, or a pointer to null, does nothing.
 DIRBASE_EXPORT void free_ldap_escDN(ldap_escDN** dn);  // sets *dn to null
@@ -242,4 +247,4 @@ DIRBASE_EXPORT void insert_ldapDN_elem33(ldap_escDN* dn, ldapDN_elem33* rdn);
 // A deep copy of one RDN; null for null and without memory.
 DIRBASE_EXPORT ldapDN_elem33* copy_ldapDN_elem33(const ldapDN_elem33* rdn);
 
-}  // extern "C"
+DIRBASE_C_END

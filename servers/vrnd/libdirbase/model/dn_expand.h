@@ -7,7 +7,7 @@
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libdirbase/model/entry.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Reads e_dn tolerantly, as dn_normalize_light leaves it (so a hexadecimal pair is no pair any more). Returns
 // LDAP_SUCCESS; -1 for a null entry or an empty DN; LDAP_INVALID_DN_SYNTAX for a pair without "="; LDAP_OTHER for an
@@ -19,4 +19,4 @@ DIRBASE_EXPORT int expand_rdn(Entry* entry);
 // know, LDAP_INVALID_DN_SYNTAX or LDAP_NO_MEMORY.
 DIRBASE_EXPORT int expand_rdn_esc(Entry* entry);
 
-}  // extern "C"
+DIRBASE_C_END

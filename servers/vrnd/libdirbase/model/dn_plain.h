@@ -13,20 +13,23 @@
 #include "libraries/dirbase_export.h"
 
 // A pair; the pairs of an RDN; the RDNs of a DN. Each record owns what it points to, texts of malloc among it.
+typedef struct rdn_type rdn_type;
 struct rdn_type {
     char* type;
     char* value;
 };
+typedef struct rdn_list rdn_list;
 struct rdn_list {
     rdn_type* rdn;
     rdn_list* next;
 };
+typedef struct dn_list dn_list;
 struct dn_list {
     rdn_list* rdns;
     dn_list* next;
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- normalising in place -------------------------------------------------------------------------------------------
 
@@ -99,4 +102,4 @@ DIRBASE_EXPORT void rdn_type_delete(rdn_type* rdn);
 DIRBASE_EXPORT void rdn_list_delete(rdn_list* list);
 DIRBASE_EXPORT void dn_list_delete(dn_list* list);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -4,11 +4,13 @@
 // a back end and a DN that isn't normalised come together, the caller holds the read side of the schema lock.
 #pragma once
 
+#include <stdbool.h>
+
 #include "libraries/dirbase_export.h"
 
-struct Backend;
+typedef struct Backend Backend;
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Whether the suffix ends the DN: it is the whole DN, or all behind one of its ",". The first compares copies in upper
 // case and gives false without memory, the second the texts as they are. False for a null text.
@@ -34,4 +36,4 @@ DIRBASE_EXPORT char* dn_parent_norm(Backend* be, const char* dn);
 DIRBASE_EXPORT int dn_get_parent(Backend* be, const char* dn, char** parent);
 DIRBASE_EXPORT int dn_get_parent_norm(Backend* be, const char* dn, char** parent, int copy);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -2,12 +2,12 @@
 // 4.5.2).
 #pragma once
 
-#include <cstddef>
+#include <stddef.h>
 
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libdirbase/model/entry.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Encodes an entry: SEQUENCE { DN, SEQUENCE OF { type, SET OF value } }, attributes in order of arrival.
 //
@@ -17,6 +17,6 @@ extern "C" {
 // Returns LDAP_SUCCESS; LDAP_OPERATIONS_ERROR for a null argument, an entry without a DN and when encoding fails;
 // LDAP_NO_MEMORY when it can't be begun. After a failure *buffer is null and *length 0. Any number of threads may
 // encode entries that nobody changes.
-DIRBASE_EXPORT int entry2ber(const Entry* entry, char** buffer, std::size_t* length);
+DIRBASE_EXPORT int entry2ber(const Entry* entry, char** buffer, size_t* length);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -5,7 +5,7 @@
 #include "libraries/libcfg/cfg.h"
 #include "servers/vrnd/libdirbase/model/entry.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Makes an entry from one that a configuration search has found, with a value tree and each value once. e_norm_dn stays
 // null.
@@ -18,4 +18,4 @@ extern "C" {
 // read side of the schema lock.
 DIRBASE_EXPORT Entry* CFGMessage2Entry(cfg_handle* cfg, cfg_message* message);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -10,7 +10,7 @@
 #include "servers/vrnd/libdirbase/model/entry.h"
 #include "servers/vrnd/libdirbase/model/ldap_mods.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Makes the modifications that add the attributes: for each of them an add of copies of all its values, as bervals (an
 // attribute that never had values gives one with none). Null when memory ran out.
@@ -38,4 +38,4 @@ DIRBASE_EXPORT int diffEntriesToMods(const Attribute* new_first, const Attribute
 // the schema lock.
 DIRBASE_EXPORT int LDAPModToEntry(Entry** entry, char* dn, LDAPMod* const* mods);
 
-}  // extern "C"
+DIRBASE_C_END

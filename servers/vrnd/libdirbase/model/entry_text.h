@@ -15,15 +15,15 @@
 // then the caller holds its mutex from before the call until he is done with the text.
 #pragma once
 
-#include <cstddef>
+#include <stddef.h>
 
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libdirbase/model/entry.h"
 
 // Bits of the options of entry2str_options.
-constexpr int ENTRY_TEXT_ID = 0x01;  // with the id line, and "*" in place of each value of type-only attributes
+DIRBASE_NUMBER(int, ENTRY_TEXT_ID, 0x01);  // with the id line, and "*" in place of each value of type-only attributes
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- reading --------------------------------------------------------------------------------------------------------
 
@@ -51,8 +51,8 @@ DIRBASE_EXPORT Entry* str2entry(char* text, int check_duplicates, int normalize)
 //   options   ENTRY_TEXT_ bits; print_id is 1 or 0 for the first of them
 //
 // Return the text; null for a null entry and without memory.
-DIRBASE_EXPORT char* entry2str_options(const Entry* entry, std::size_t* length, int options);
-DIRBASE_EXPORT char* entry2str(const Entry* entry, std::size_t* length, int print_id);
+DIRBASE_EXPORT char* entry2str_options(const Entry* entry, size_t* length, int options);
+DIRBASE_EXPORT char* entry2str(const Entry* entry, size_t* length, int print_id);
 
 // Write an entry without members.
 //
@@ -67,10 +67,10 @@ DIRBASE_EXPORT char* entry2str(const Entry* entry, std::size_t* length, int prin
 // and individual policy) and attributes that the schema doesn't know.
 //
 // Return the text, which is *buffer, or null as above.
-DIRBASE_EXPORT char* entry2str_wo_members(const Entry* entry, std::size_t* length, int print_id, char** buffer,
-                                          std::size_t* size, int ignored);
-DIRBASE_EXPORT char* entry2str_wo_members_and_pwd_attribs(const Entry* entry, std::size_t* length, int print_id,
-                                                          char** buffer, std::size_t* size);
+DIRBASE_EXPORT char* entry2str_wo_members(const Entry* entry, size_t* length, int print_id, char** buffer, size_t* size,
+                                          int ignored);
+DIRBASE_EXPORT char* entry2str_wo_members_and_pwd_attribs(const Entry* entry, size_t* length, int print_id,
+                                                          char** buffer, size_t* size);
 
 // ---- the buffer -----------------------------------------------------------------------------------------------------
 
@@ -82,12 +82,12 @@ DIRBASE_EXPORT char* entry2str_wo_members_and_pwd_attribs(const Entry* entry, st
 //   buffer  *buffer is a block of malloc or null; with a new one the cursor moves along
 //   cursor  *cursor is a position in it
 //   size    of the buffer, 0 for null; takes the new one
-DIRBASE_EXPORT void MAKE_SPACE(std::size_t needed, int* error, char** buffer, char** cursor, std::size_t* size);
+DIRBASE_EXPORT void MAKE_SPACE(size_t needed, int* error, char** buffer, char** cursor, size_t* size);
 
 // The global buffer: its start, the cursor in it, and its size. It grows and stays for the process.
 DIRBASE_EXPORT extern char* ebuf_global;
 DIRBASE_EXPORT extern char* ecur_global;
-DIRBASE_EXPORT extern std::size_t emaxsize_global;
+DIRBASE_EXPORT extern size_t emaxsize_global;
 
 // Its mutex, entry2str_mutex, which isn't recursive. initEnt2StrMutex makes it, at start-up while there is one thread,
 // and does nothing from the second call on.
@@ -95,4 +95,4 @@ DIRBASE_EXPORT void initEnt2StrMutex(void);
 DIRBASE_EXPORT void lockEnt2StrMutex(void);
 DIRBASE_EXPORT void unlockEnt2StrMutex(void);
 
-}  // extern "C"
+DIRBASE_C_END

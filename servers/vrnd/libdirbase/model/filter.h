@@ -8,32 +8,33 @@
 // Nothing here locks: a filter is changed by one thread at a time, and read by any number while nobody changes it.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/berval.h"
 
 // What f_choice holds: the tag of the choice in BER.
-constexpr std::uint64_t LDAP_FILTER_AND = 0xa0;
-constexpr std::uint64_t LDAP_FILTER_OR = 0xa1;
-constexpr std::uint64_t LDAP_FILTER_NOT = 0xa2;
-constexpr std::uint64_t LDAP_FILTER_EQUALITY = 0xa3;
-constexpr std::uint64_t LDAP_FILTER_SUBSTRINGS = 0xa4;
-constexpr std::uint64_t LDAP_FILTER_GE = 0xa5;
-constexpr std::uint64_t LDAP_FILTER_LE = 0xa6;
-constexpr std::uint64_t LDAP_FILTER_PRESENT = 0x87;
-constexpr std::uint64_t LDAP_FILTER_APPROX = 0xa8;
-constexpr std::uint64_t LDAP_FILTER_EXTENDED = 0xa9;  // never in a record
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_AND, 0xa0);
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_OR, 0xa1);
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_NOT, 0xa2);
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_EQUALITY, 0xa3);
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_SUBSTRINGS, 0xa4);
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_GE, 0xa5);
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_LE, 0xa6);
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_PRESENT, 0x87);
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_APPROX, 0xa8);
+DIRBASE_NUMBER(uint64_t, LDAP_FILTER_EXTENDED, 0xa9);  // never in a record
 
 // The tags of the pieces of a substring filter in BER.
-constexpr unsigned LDAP_SUBSTRING_INITIAL = 0x80;
-constexpr unsigned LDAP_SUBSTRING_ANY = 0x81;
-constexpr unsigned LDAP_SUBSTRING_FINAL = 0x82;
+DIRBASE_NUMBER(unsigned, LDAP_SUBSTRING_INITIAL, 0x80);
+DIRBASE_NUMBER(unsigned, LDAP_SUBSTRING_ANY, 0x81);
+DIRBASE_NUMBER(unsigned, LDAP_SUBSTRING_FINAL, 0x82);
 
 // The deepest nesting that is parsed: "(a=b)" is one level, "(!(a=b))" two.
-constexpr unsigned FILTER_MAX_DEPTH = 100;
+DIRBASE_NUMBER(unsigned, FILTER_MAX_DEPTH, 100);
 
 // An assertion about an attribute's value.
+typedef struct ava ava;
 struct ava {
     char* ava_type;
     berval ava_value;    // in normal form, once it was parsed so; a zero byte stands behind the bytes
@@ -41,6 +42,7 @@ struct ava {
 };
 
 // What a substring filter looks for. Pieces are zero-terminated texts; those that aren't wanted are null.
+typedef struct filter_substrings filter_substrings;
 struct filter_substrings {
     char* f_sub_type;
     char* f_sub_initial;
@@ -48,8 +50,9 @@ struct filter_substrings {
     char* f_sub_final;
 };
 
+typedef struct Filter Filter;
 struct Filter {
-    std::uint64_t f_choice;
+    uint64_t f_choice;
     union {
         Filter* f_list;           // AND, OR, NOT: the first child, the others behind it by f_next
         char* f_type;             // presence
@@ -59,7 +62,7 @@ struct Filter {
     Filter* f_next;  // the next child of the same parent
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Zeroes a record.
 DIRBASE_EXPORT void ava_init(ava* assertion);
@@ -83,24 +86,28 @@ DIRBASE_EXPORT void filter_print(const Filter* filter);
 // back end compares with what it has stored, and swaps back. Returns 1 when the last filter was swapped, else 0.
 DIRBASE_EXPORT int filter_swap_with_encoded(Filter* filter);
 
-}  // extern "C"
+DIRBASE_C_END
+
+#ifdef __cplusplus
 
 // Whether a choice has children, or an assertion.
-constexpr bool filter_has_list(std::uint64_t choice)
+constexpr bool filter_has_list(uint64_t choice)
 {
     return choice == LDAP_FILTER_AND || choice == LDAP_FILTER_OR || choice == LDAP_FILTER_NOT;
 }
-constexpr bool filter_has_ava(std::uint64_t choice)
+constexpr bool filter_has_ava(uint64_t choice)
 {
     return choice == LDAP_FILTER_EQUALITY || choice == LDAP_FILTER_GE || choice == LDAP_FILTER_LE ||
            choice == LDAP_FILTER_APPROX;
 }
 
 // What stands between type and value of an assertion.
-constexpr const char* filter_comparison(std::uint64_t choice)
+constexpr const char* filter_comparison(uint64_t choice)
 {
     return choice == LDAP_FILTER_GE       ? ">="
            : choice == LDAP_FILTER_LE     ? "<="
            : choice == LDAP_FILTER_APPROX ? "~="
                                           : "=";
 }
+
+#endif

@@ -17,16 +17,16 @@
 // (FILTER_MAX_DEPTH) is safe.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libdirbase/model/entry.h"
 #include "servers/vrnd/libdirbase/model/filter.h"
 
-constexpr int FILTER_TRUE = 0;
-constexpr int FILTER_FALSE = -1;
+DIRBASE_NUMBER(int, FILTER_TRUE, 0);
+DIRBASE_NUMBER(int, FILTER_FALSE, -1);
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Evaluates a filter. The first call in a process asks for the environment variable OC_ALIAS: "YES" in any case has
 // equality tests on objectclass take any name of a class, or its OID, for its first name. Without memory to read it the
@@ -39,12 +39,12 @@ DIRBASE_EXPORT int test_filter(const Entry* entry, const Filter* filter);
 
 // The filters from `first` on along f_next, joined by LDAP_FILTER_AND or LDAP_FILTER_OR; a list without members is
 // false. LDAP_OPERATIONS_ERROR for another choice.
-DIRBASE_EXPORT int test_filter_list(const Entry* entry, const Filter* first, std::uint64_t choice);
+DIRBASE_EXPORT int test_filter_list(const Entry* entry, const Filter* first, uint64_t choice);
 
 // Equality or an ordering. Of an attribute encrypted two ways the decoded values count where there are any, of one
 // encrypted one way the assertion is the password in the clear and only the first version is asked; orderings see the
 // stored form of either. Where value_cmp can't compare, as with a bad time, the stored value counts as the greater one.
-DIRBASE_EXPORT int test_ava_filter(const Entry* entry, const ava* assertion, std::uint64_t choice);
+DIRBASE_EXPORT int test_ava_filter(const Entry* entry, const ava* assertion, uint64_t choice);
 
 // Whether the entry has a version of the attribute; false for null arguments.
 DIRBASE_EXPORT int test_presence_filter(const Entry* entry, const char* type);
@@ -82,4 +82,4 @@ DIRBASE_EXPORT char* word_dup(const char* text);
 // nothing to be made, and it may be left out.
 DIRBASE_EXPORT void InitRegex(void);
 
-}  // extern "C"
+DIRBASE_C_END

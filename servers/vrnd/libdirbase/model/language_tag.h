@@ -7,19 +7,20 @@
 // Any thread may call these on texts of its own.
 #pragma once
 
-#include <cstddef>
+#include <stdbool.h>
+#include <stddef.h>
 
 #include "libraries/dirbase_export.h"
 
-constexpr std::size_t longest_language_tag = 240;
-constexpr std::size_t language_tag_buffer = longest_language_tag + 1;
+DIRBASE_NUMBER(size_t, longest_language_tag, 240);
+DIRBASE_NUMBER(size_t, language_tag_buffer, longest_language_tag + 1);
 
 // What parse_language_tags is to give.
-constexpr int LANGUAGE_BASE_AND_TAG = 0;
-constexpr int LANGUAGE_TAG = 1;
-constexpr int LANGUAGE_BASE = 2;
+DIRBASE_NUMBER(int, LANGUAGE_BASE_AND_TAG, 0);
+DIRBASE_NUMBER(int, LANGUAGE_TAG, 1);
+DIRBASE_NUMBER(int, LANGUAGE_BASE, 2);
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Splits a name at its last ";". A name without a tag gives nothing.
 //
@@ -31,11 +32,12 @@ extern "C" {
 //
 // Returns LDAP_SUCCESS; LDAP_OTHER for another mode or a null name; LDAP_INVALID_SYNTAX for a tag that is too long;
 // LDAP_NO_MEMORY. After a failure nothing was given.
-DIRBASE_EXPORT int parse_language_tags(const char* name, char** base, char** tag, int mode, int allocate = 0);
+DIRBASE_EXPORT int parse_language_tags(const char* name, char** base, char** tag, int mode,
+                                       int allocate DIRBASE_DEFAULT(0));
 
 // The same into a buffer of language_tag_buffer bytes (may be null in mode LANGUAGE_BASE), which holds the empty text
 // when there is no tag. `tag_length`, unless null, takes the length of what it holds.
-DIRBASE_EXPORT int parse_language_tags_with_buffer(const char* name, char** base, char* tag, std::size_t* tag_length,
+DIRBASE_EXPORT int parse_language_tags_with_buffer(const char* name, char** base, char* tag, size_t* tag_length,
                                                    int mode);
 
 // Whether a tag is a language tag: "lang-", letters, and then perhaps parts of letters and digits, each behind one
@@ -48,7 +50,11 @@ DIRBASE_EXPORT bool contains_valid_language_tag(const char* name);
 // The order of two tags: none (a null or empty text) is below all others.
 DIRBASE_EXPORT int strtagcmp(const char* a, const char* b);
 
-}  // extern "C"
+DIRBASE_C_END
+
+#ifdef __cplusplus
 
 // The tag at the end of a name, of any length and as it is written; null when there is none.
 const char* find_language_tag(const char* name);
+
+#endif

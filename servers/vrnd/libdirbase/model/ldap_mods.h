@@ -8,7 +8,7 @@
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/ldap_mod.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- making and releasing -------------------------------------------------------------------------------------------
 
@@ -56,4 +56,4 @@ DIRBASE_EXPORT LDAPMod** DuplicateMods(LDAPMod* const* array);
 // Returns LDAP_SUCCESS, LDAP_OTHER for a null `array`, or LDAP_NO_MEMORY with both arrays as they were.
 DIRBASE_EXPORT int modarray_merge(LDAPMod*** array, LDAPMod** other);
 
-}  // extern "C"
+DIRBASE_C_END

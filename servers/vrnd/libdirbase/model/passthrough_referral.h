@@ -4,7 +4,7 @@
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libdirbase/model/entry.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Checks what such an entry says about finding its owner on the other server: the first value of xan-ptaLinkAttribute,
 // where there is that attribute, is the name of an attribute, or "_DN_" or "_DISABLE_" in any case; and that of
@@ -14,4 +14,4 @@ extern "C" {
 // schema lock.
 DIRBASE_EXPORT int checkPassthroughReferral(const Entry* entry);
 
-}  // extern "C"
+DIRBASE_C_END

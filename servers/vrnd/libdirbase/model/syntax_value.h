@@ -6,11 +6,11 @@
 // dn_check says in the case of a DN.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Whether a text is an integer from -2147483648 to 2147483647, in at most ten digits behind a sign or none: 0 or 21.
 // No digits at all is the integer 0.
@@ -18,12 +18,12 @@ DIRBASE_EXPORT int int_str_check(const char* text);
 
 // The integer that a text stands for, or 1 for "TRUE" and 0 for "FALSE" in any case: a new integer for the caller to
 // free(). `result` receives 0; or 21 when the text is none, or 90 when memory ran out, and the return is null.
-DIRBASE_EXPORT std::int32_t* str2int(const char* text, int* result);
-DIRBASE_EXPORT std::int32_t* str2bool(const char* text, int* result);
+DIRBASE_EXPORT int32_t* str2int(const char* text, int* result);
+DIRBASE_EXPORT int32_t* str2bool(const char* text, int* result);
 
 // Whether a text is legal for a syntax: 0; 21; 34 when a DN is bad; 1 when the clock can't be read for a UTC Time.
 // Texts and bytes are always legal, and so is everything of a syntax that isn't known.
-DIRBASE_EXPORT int check_syntax(std::uint32_t syntax, const char* text);
+DIRBASE_EXPORT int check_syntax(uint32_t syntax, const char* text);
 
 // How many bytes a value takes in a value tree.
 //
@@ -32,14 +32,14 @@ DIRBASE_EXPORT int check_syntax(std::uint32_t syntax, const char* text);
 //                bytes aren't held in the tree.
 //
 // Returns 0, or 21 with length 0 for an unknown syntax.
-DIRBASE_EXPORT int find_value_length(std::uint32_t syntax, int text_length, int* length);
+DIRBASE_EXPORT int find_value_length(uint32_t syntax, int text_length, int* length);
 
-// The typed form of a value, in a new block for the caller to free(): of SC_INT and SC_BOOL an std::int32_t, of SC_GT
+// The typed form of a value, in a new block for the caller to free(): of SC_INT and SC_BOOL an int32_t, of SC_GT
 // and SC_UTCT a tag_timestamp_struct (timestamp.h).
 //
 //   result  receives 0; on failure that of str2int, str2bool or str2timestamp, or 21 for an unknown syntax.
 //
 // Returns null on failure, and for a syntax that has no typed form with a result of 0.
-DIRBASE_EXPORT void* str2syntaxvalue(const char* text, std::uint32_t syntax, int* result);
+DIRBASE_EXPORT void* str2syntaxvalue(const char* text, uint32_t syntax, int* result);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -11,27 +11,32 @@
 // process's time zone: no thread may change the variable TZ meanwhile.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
+#include <stddef.h>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 
 // A time. Value trees hold its bytes as they are. There is no year 0: year 1 follows -1.
+typedef struct tag_timestamp_struct tag_timestamp_struct;
 struct tag_timestamp_struct {
-    std::int16_t year;
-    std::int16_t month;  // from 1
-    std::int16_t day;    // from 1
-    std::int16_t hour;
-    std::int16_t minute;
-    std::int16_t second;
-    std::int32_t fraction;  // nanoseconds, in whole microseconds
+    int16_t year;
+    int16_t month;  // from 1
+    int16_t day;    // from 1
+    int16_t hour;
+    int16_t minute;
+    int16_t second;
+    int32_t fraction;  // nanoseconds, in whole microseconds
 
+#ifdef __cplusplus
     friend bool operator==(const tag_timestamp_struct&, const tag_timestamp_struct&) = default;
+#endif
 };
+#ifdef __cplusplus
 static_assert(sizeof(tag_timestamp_struct) == 16 && offsetof(tag_timestamp_struct, fraction) == 12,
               "value trees hold times in 16 bytes");
+#endif
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Whether the month has the day: 0 or 21. `time` isn't null; year and month have been checked already.
 DIRBASE_EXPORT int check_date(const tag_timestamp_struct* time);
@@ -70,6 +75,6 @@ DIRBASE_EXPORT int str2UTCTime(const char* text, tag_timestamp_struct* time);
 //
 //   result  receives 0, a code of the two functions above, 90 when memory ran out, or 1 for another syntax code; the
 //           return is null then.
-DIRBASE_EXPORT tag_timestamp_struct* str2timestamp(const char* text, std::uint32_t syntax, int* result);
+DIRBASE_EXPORT tag_timestamp_struct* str2timestamp(const char* text, uint32_t syntax, int* result);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -13,17 +13,17 @@
 // record is read. The values that are given may not be the attribute's own array.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 
 // Bits of the mode of create_normalized_values.
-constexpr int VALUES_TREE_ONLY = 1;  // the array isn't touched: `values` are in it already
-constexpr int VALUES_ARE_CLEAR =
-    2;  // the values have been decoded, so their tree is kept for an encrypted attribute, too
+DIRBASE_NUMBER(int, VALUES_TREE_ONLY, 1);  // the array isn't touched: `values` are in it already
+// The values have been decoded, so their tree is kept for an encrypted attribute, too.
+DIRBASE_NUMBER(int, VALUES_ARE_CLEAR, 2);
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Appends copies of values, unchecked. A value tree is dropped, as it would lack them; the next value_add_normalize
 // builds it anew, so the two don't go well in turns. Returns LDAP_SUCCESS or LDAP_NO_MEMORY.
@@ -40,8 +40,8 @@ DIRBASE_EXPORT int value_add(berval*** array, berval** values, Attribute* attr);
 //   old_count  values in the array
 //   added      values in `values`, none of them null
 //   capacity   room of the array in pointers, 0 for null; takes the new one
-DIRBASE_EXPORT int value_add_fast(berval*** array, berval** values, std::int64_t old_count, std::int64_t added,
-                                  std::int64_t* capacity);
+DIRBASE_EXPORT int value_add_fast(berval*** array, berval** values, int64_t old_count, int64_t added,
+                                  int64_t* capacity);
 
 // Appends values and keeps the value tree: create_normalized_values on an array that is made to fit.
 //
@@ -50,7 +50,7 @@ DIRBASE_EXPORT int value_add_fast(berval*** array, berval** values, std::int64_t
 //
 // Returns what create_normalized_values gives. A value takes its slot in the array, two blocks for its copy, and two
 // for its node and that of the tree; the cost of one grows with the logarithm of their number.
-DIRBASE_EXPORT int value_add_normalize(berval*** array, berval** values, std::uint32_t syntax, Attribute* attr,
+DIRBASE_EXPORT int value_add_normalize(berval*** array, berval** values, uint32_t syntax, Attribute* attr,
                                        int drop_duplicates, int decode);
 
 // Puts values into an array that has the room for them, and into the value tree.
@@ -72,9 +72,9 @@ DIRBASE_EXPORT int value_add_normalize(berval*** array, berval** values, std::ui
 //
 // Returns LDAP_SUCCESS; LDAP_OPERATIONS_ERROR for a null attribute; LDAP_OTHER when duplicates are to be dropped in a
 // mode that makes no nodes; the failure to make a node; LDAP_NO_MEMORY. On failure out_count is 0.
-DIRBASE_EXPORT int create_normalized_values(int mode, std::int64_t* out_count, std::int64_t new_count,
-                                            std::int64_t old_count, berval** values, berval*** array, Attribute* attr,
-                                            std::uint32_t syntax, int drop_duplicates);
+DIRBASE_EXPORT int create_normalized_values(int mode, int64_t* out_count, int64_t new_count, int64_t old_count,
+                                            berval** values, berval*** array, Attribute* attr, uint32_t syntax,
+                                            int drop_duplicates);
 
 // Makes an array of values with those in a two-way stored form decoded by the server's key. All others are the caller's
 // own records, and so is a value that claims to be encoded and can't be decoded: it stands for itself, as
@@ -88,4 +88,4 @@ DIRBASE_EXPORT int dup_and_decode_vals(berval** values, berval*** copies);
 // Releases such an array and overwrites what was decoded. Null does nothing.
 DIRBASE_EXPORT void free_dup_vals(berval** values, berval** copies);
 
-}  // extern "C"
+DIRBASE_C_END

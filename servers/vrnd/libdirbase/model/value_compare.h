@@ -4,21 +4,22 @@
 // zero byte.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/berval.h"
 
 // A value in normal form. Record, berval and content are one block, with a zero byte behind the content.
+typedef struct AttrvalsNorm AttrvalsNorm;
 struct AttrvalsNorm {
-    std::uint32_t syntax;      // code of the content
-    std::int32_t owns_buffer;  // not 0: the content is a block of its own, released with the node
-    berval* value;             // always &stored
+    uint32_t syntax;      // code of the content
+    int32_t owns_buffer;  // not 0: the content is a block of its own, released with the node
+    berval* value;        // always &stored
     berval stored;  // of text the normal form; of a binary value its length and no bytes; of integers and booleans
-                    // an std::int32_t, of times a tag_timestamp_struct (timestamp.h)
+                    // an int32_t, of times a tag_timestamp_struct (timestamp.h)
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Compares two values.
 //
@@ -31,11 +32,11 @@ extern "C" {
 // has for a bad time, and LDAP_INVALID_SYNTAX for another code.
 //
 // Any thread may call it; for DNs that have to be normalised it holds the read side of the schema lock.
-DIRBASE_EXPORT int value_cmp(const berval* a, const berval* b, std::uint32_t syntax, int raw);
+DIRBASE_EXPORT int value_cmp(const berval* a, const berval* b, uint32_t syntax, int raw);
 
 // The order of a value tree, in the form of an avl_cmp. Both are AttrvalsNorm of one syntax; the code of the first
 // tells how they compare. Binary values compare by length alone. LDAP_INVALID_SYNTAX for another code. Nothing is
 // allocated.
-DIRBASE_EXPORT int value_cmp_fast(const void* a, const void* b, int unused = 0);
+DIRBASE_EXPORT int value_cmp_fast(const void* a, const void* b, int unused DIRBASE_DEFAULT(0));
 
-}  // extern "C"
+DIRBASE_C_END

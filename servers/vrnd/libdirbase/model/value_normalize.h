@@ -17,24 +17,24 @@
 // Any thread may call these on texts of its own. For DNs it holds the read side of the schema lock.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "libraries/libber/berval.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Normalises a text in place, except for a DN, whose text is replaced by a new one and released.
 //
 //   text  address of a text of malloc; *text stays at the start of it in all cases.
-DIRBASE_EXPORT int value_normalize(char** text, std::uint32_t syntax);
+DIRBASE_EXPORT int value_normalize(char** text, uint32_t syntax);
 
 // The same for a value, whose length becomes that of its normal form. The buffer is kept where the normal form fits
 // into it. Else a new one takes its place, which only happens to DNs.
 //
 //   value     not null; null bytes are the empty text.
 //   embedded  not 0: the buffer is part of another block, so it isn't released when it is replaced.
-DIRBASE_EXPORT int value_normalize_berval(berval* value, std::uint32_t syntax, int embedded);
+DIRBASE_EXPORT int value_normalize_berval(berval* value, uint32_t syntax, int embedded);
 
 // Prepares a value for the relational store: a copy, normalised where that can be done and as given where not.
 //
@@ -42,6 +42,6 @@ DIRBASE_EXPORT int value_normalize_berval(berval* value, std::uint32_t syntax, i
 //           zero byte behind them. For a code with SC_BIN *target is set to null instead.
 //
 // Returns LDAP_SUCCESS, also when the normal form is refused; or LDAP_NO_MEMORY, and the record is empty.
-DIRBASE_EXPORT int value_normalize_for_tables(const berval* source, berval** target, std::uint32_t syntax);
+DIRBASE_EXPORT int value_normalize_for_tables(const berval* source, berval** target, uint32_t syntax);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -5,18 +5,24 @@
 // can be in progress. The life cycle runs on one thread at start-up. No function raises an exception.
 #pragma once
 
+#include <stdbool.h>
+
 #include "servers/vrnd/libdirbase/base/backend.h"
 #include "servers/vrnd/libdirbase/locking/rdbm_lock.h"
 #include "servers/vrnd/libdirbase/schema/asyntaxinfo.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_hash.h"
-#include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
 
-struct Entry;
+#ifdef __cplusplus
+#include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
+#endif
+
+typedef struct Entry Entry;
+typedef struct ldcf_schema ldcf_schema;  // opaque in C
 
 // What ldcf_api_attrtype_apply calls for each attribute type; a result other than 0 ends the walk.
-using ldcf_attrtype_function = int (*)(asyntaxinfo* info, void* argument);
+typedef int (*ldcf_attrtype_function)(asyntaxinfo* info, void* argument);
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // ---- life cycle, in this order ------------------------------------------------------------------------------------
 
@@ -47,9 +53,9 @@ DIRBASE_EXPORT extern rdbm_lock_t ldcf_api_modify_attr_info_lock_g;
 DIRBASE_EXPORT rdbm_lock_t* ldcf_api_get_modify_attr_info_lock_g(void);
 
 // How strictly entries are checked; 2 at start. Set before other threads read it.
-DIRBASE_EXPORT extern std::int32_t ldcf_api_schema_check_g;
-DIRBASE_EXPORT void ldcf_api_set_schema_check(std::int32_t mode);
-DIRBASE_EXPORT std::int32_t ldcf_api_get_schema_check(void);
+DIRBASE_EXPORT extern int32_t ldcf_api_schema_check_g;
+DIRBASE_EXPORT void ldcf_api_set_schema_check(int32_t mode);
+DIRBASE_EXPORT int32_t ldcf_api_get_schema_check(void);
 
 // The active schema as the entry "cn=schema", kept by the schema back end; null when it must be built again.
 DIRBASE_EXPORT extern Entry* ldcf_api_schema_entry_g;
@@ -154,7 +160,9 @@ DIRBASE_EXPORT char** ldcf_api_get_nonencrypted_attrs(void);    // an empty arra
 DIRBASE_EXPORT int ldcf_api_schema_contains_encrypted_attributes(void);
 
 // ---- for callers that know the classes -----------------------------------------------------------------------------
-// Plain names, like all others here, though no C program can use what they return.
+// Plain names, like all others here, though no C program can use what they take or return.
+
+#ifdef __cplusplus
 
 #ifdef __clang__
 #pragma clang diagnostic push
@@ -183,4 +191,6 @@ DIRBASE_EXPORT asyntaxinfo* ldcf_attrtype_get_info_based_on_table(const ldcf_map
                                                                   const char* table);
 DIRBASE_EXPORT objectclassinfo* ldcf_objectclass_get_info(const ldcf_map_name_to<ldcf_objclass>& map, const char* name);
 
-}  // extern "C"
+#endif
+
+DIRBASE_C_END

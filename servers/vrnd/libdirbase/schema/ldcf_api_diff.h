@@ -1,11 +1,15 @@
 // How an object class differs between the active schema and the proposed one.
 #pragma once
 
-#include <cstdint>
+#include <stdint.h>
 
+#include "libraries/dirbase_export.h"
+
+#ifdef __cplusplus
 #include "servers/vrnd/libdirbase/schema/ldcf_objclass.h"
+#endif
 
-enum attr_diff_state : int {
+enum attr_diff_state DIRBASE_ENUM_INT {
     attr_diff_none = 1,  // start value, never reported
     attr_diff_newly_must = 2,
     attr_diff_no_longer_must = 3,
@@ -16,19 +20,23 @@ enum attr_diff_state : int {
 };
 
 // One attribute whose place in a class has changed.
+typedef struct ldcf_diff_node ldcf_diff_node;
 struct ldcf_diff_node {
     char* oid;  // owned
-    attr_diff_state state;
+    enum attr_diff_state state;
     ldcf_diff_node* next;
 };
 
 // All of them.
+typedef struct ldcf_diff_info ldcf_diff_info;
 struct ldcf_diff_info {
     ldcf_diff_node* list;
-    std::int32_t count;
+    int32_t count;
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
+
+#ifdef __cplusplus
 
 // What has changed in the MUST and MAY lists of a class that exists in both schemas; inherited attributes don't count.
 // Returns a new record, for the caller to take apart with ldcf_api_list_diff_info_delete on its list and free(), or
@@ -43,8 +51,10 @@ DIRBASE_EXPORT int ldcf_api_compare_type(const ldcf_objclass& objclass);
 // memory ran out.
 DIRBASE_EXPORT int ldcf_api_compare_SUP(const ldcf_objclass& objclass);
 
+#endif
+
 // A node with a copy of the text; null when memory ran out.
-DIRBASE_EXPORT ldcf_diff_node* ldcf_api_list_diff_info_new(const char* oid, attr_diff_state state);
+DIRBASE_EXPORT ldcf_diff_node* ldcf_api_list_diff_info_new(const char* oid, enum attr_diff_state state);
 
 // Puts a node ahead of a list. Returns 0, or -1 for a null argument.
 DIRBASE_EXPORT int ldcf_api_list_diff_info_insert(ldcf_diff_node** head, ldcf_diff_node* node);
@@ -52,4 +62,4 @@ DIRBASE_EXPORT int ldcf_api_list_diff_info_insert(ldcf_diff_node** head, ldcf_di
 // Frees a list and its texts.
 DIRBASE_EXPORT void ldcf_api_list_diff_info_delete(ldcf_diff_node* head);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -9,7 +9,7 @@
 #include "servers/vrnd/libdirbase/schema/ldcf_rdbm.h"
 
 class ldcf_attrtype;
-class ldcf_attrtype_;
+struct ldcf_attrtype_;
 
 // How far a type has come. Parsing into a type needs a state below `completing`.
 enum class ldcf_attrtype_state : int {
@@ -132,8 +132,7 @@ public:
     bool xan_syntax_equal(const ldcf_attrtype& other) const;
 };
 
-class DIRBASE_EXPORT ldcf_attrtype_ : public csgl_refcounted<ldcf_attrtype_> {
-public:
+struct DIRBASE_EXPORT ldcf_attrtype_ : public csgl_refcounted<ldcf_attrtype_> {
     explicit ldcf_attrtype_(const csgl_string& oid) : oid_(oid) {}
 
     // The standard definition.

@@ -8,18 +8,27 @@
 // threads; the entry belongs to the caller.
 #pragma once
 
+#include <stdbool.h>
+
 #include "servers/vrnd/libdirbase/model/attribute.h"
+
+#ifdef __cplusplus
 #include "servers/vrnd/libdirbase/schema/ldcf_entry_finding.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
+#endif
+
+typedef struct ldcf_schema ldcf_schema;  // opaque in C
 
 // How entries are checked, the values of ldcf_api_set_schema_check. Any other value leaves out the tests of the number
 // of structural classes and of superclasses.
-enum ldcf_schema_check_mode : int {
+enum ldcf_schema_check_mode DIRBASE_ENUM_INT {
     ldcf_check_declared = 1,  // the older check, by what each class itself declares (ldcf_oc_check.h)
     ldcf_check_strict = 2,    // one base structural class; a missing superclass is a fault, but for `top`
     ldcf_check_lenient = 3,   // any number of structural classes but none; missing superclasses are added
     ldcf_check_none = 4,      // every entry passes
 };
+
+#ifdef __cplusplus
 
 // Checks an entry and hands each fault to a sink: ldcf_api_schema_check for those who want the faults as data.
 //
@@ -42,7 +51,9 @@ enum ldcf_schema_check_mode : int {
 DIRBASE_EXPORT int ldcf_check_entry(const ldcf_schema& schema, Entry* entry, int mode, bool policy, bool* added,
                                     ldcf_entry_sink& sink);
 
-extern "C" {
+#endif
+
+DIRBASE_C_BEGIN
 
 // Checks an entry against the active schema, in the mode of ldcf_api_get_schema_check, as ldcf_check_entry does; faults
 // go to the logs. An exception ends here with LDAP_OPERATIONS_ERROR, but for lack of memory in the older check, which
@@ -60,4 +71,4 @@ DIRBASE_EXPORT int check_dn_in_attr(const ldcf_schema* schema, const Attribute* 
 DIRBASE_EXPORT int check_aliasObject(const Entry* entry);
 DIRBASE_EXPORT int check_referralObject(const Entry* entry);
 
-}  // extern "C"
+DIRBASE_C_END

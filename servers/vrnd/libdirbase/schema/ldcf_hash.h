@@ -5,28 +5,29 @@
 // schema lock.
 #pragma once
 
-#include <cstddef>
-#include <cstdint>
+#include <stddef.h>
+#include <stdint.h>
 
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libdirbase/schema/asyntaxinfo.h"
 
-constexpr std::size_t ldcf_hash_slots = 7001;
-constexpr std::size_t ldcf_hash_longest_key = 1024;
+DIRBASE_NUMBER(size_t, ldcf_hash_slots, 7001);
+DIRBASE_NUMBER(size_t, ldcf_hash_longest_key, 1024);
 
 // A node. The key and the node are one block; the record is the definition's.
+typedef struct ldcf_hash_tbl_entry ldcf_hash_tbl_entry;
 struct ldcf_hash_tbl_entry {
     char* name;  // the key, in upper case
     asyntaxinfo* info;
-    std::int32_t length;  // of the key
+    int32_t length;  // of the key
     ldcf_hash_tbl_entry* next;
 };
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // The slot of a key, which isn't null: the hash of ELF symbol tables over its bytes as they stand, taken as signed. A
 // name is folded first.
-DIRBASE_EXPORT std::uint32_t ldcf_hash_name(const char* key);
+DIRBASE_EXPORT uint32_t ldcf_hash_name(const char* key);
 
 // The node of a name, without regard to case (only bytes from 'a' to 0x7f fold); null when the cache lacks it, the name
 // is null or has more than ldcf_hash_longest_key bytes.
@@ -41,4 +42,4 @@ DIRBASE_EXPORT void ldcf_hash_flush(void);
 // Writes the cache to a file, for the developer; does nothing when the file can't be opened.
 DIRBASE_EXPORT void ldcf_debug_hash_tbl(const char* filename);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -5,9 +5,11 @@
 // changed. None raises an exception.
 #pragma once
 
+#include <stdbool.h>
+
 #include "servers/vrnd/libdirbase/model/attribute.h"
 
-extern "C" {
+DIRBASE_C_BEGIN
 
 // Checks an entry: the attributes that its classes require, those that they permit, its DN and the values that are DNs
 // by their grammar (dn_check.h), and the number of values of boolean attributes. An alias is only asked for what the
@@ -35,4 +37,4 @@ DIRBASE_EXPORT int oc_attr_type_cmp(const char* a, const char* b);
 //   where  0 the MAY list, 1 the MUST list, 2 both; for any other number the answer is false
 DIRBASE_EXPORT bool ldcf_api_oc_contains_attr(const char* objclass, const char* attribute, int where);
 
-}  // extern "C"
+DIRBASE_C_END

@@ -23,8 +23,7 @@ DIRBASE_EXPORT const char* ldcf_kind_of(const ldcf_matchrule& definition);
 DIRBASE_EXPORT const char* ldcf_kind_of(const ldcf_attrtype& definition);
 DIRBASE_EXPORT const char* ldcf_kind_of(const ldcf_objclass& definition);
 
-class DIRBASE_EXPORT ldcf_schema {
-public:
+struct DIRBASE_EXPORT ldcf_schema {
     // Whether a schema file has changes that are not yet on disk. A file name that is met for the first time starts as
     // modified.
     enum class modified_indicator : int { modified = 0, flushed = 1 };

@@ -21,11 +21,15 @@
 // of the first ldcf_api_schema_parse; a tool while it has the directory to itself.
 #pragma once
 
-#include <cstddef>
+#include <stddef.h>
+
+#include "libraries/dirbase_export.h"
+
+#ifdef __cplusplus
 
 #include "servers/vrnd/libdirbase/schema/ldcf_common.h"
 
-class ldcf_schema;
+struct ldcf_schema;
 
 // The name of a file's temporary file, and that under which a commit keeps the file's old content.
 DIRBASE_EXPORT csgl_string ldcf_temporary_of(const csgl_string& file);
@@ -83,10 +87,12 @@ private:
     ldcf_leftovers found_ = ldcf_leftovers::none;
 };
 
-extern "C" {
+#endif
+
+DIRBASE_C_BEGIN
 
 // Recovers the files of a schema, `count` names in `files`, and tells the debug log. Returns 0 when they can be loaded
 // now, and 1 when they can't: neither schema is whole, or a step failed, after which it can be tried again.
-DIRBASE_EXPORT int ldcf_recover_files(const char* const* files, std::size_t count);
+DIRBASE_EXPORT int ldcf_recover_files(const char* const* files, size_t count);
 
-}  // extern "C"
+DIRBASE_C_END
