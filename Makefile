@@ -20,7 +20,7 @@ TEST = ctest --parallel $(JOBS) --preset
 # ThreadSanitizer needs addresses where it expects them. Not every container lets a program ask for that, nor needs it.
 FIXED_ADDRESSES = $(shell setarch $$(uname -m) -R true 2>/dev/null && echo setarch $$(uname -m) -R)
 # What is formatted and looked at.
-CXX_FILES = find libraries servers tools tests bench fuzz -name '*.h' -o -name '*.cpp'
+CXX_FILES = find libraries servers tools tests bench fuzz examples -name '*.h' -o -name '*.cpp'
 
 .DEFAULT_GOAL := build
 .PHONY: build demo check bench fuzz check-asan check-tsan install format lint clean help

@@ -13,7 +13,7 @@ for job in "$@"; do
         # The library, the tool and the tests.
         build)
             packages+=(g++ cmake ninja-build libcli11-dev nlohmann-json3-dev libgtest-dev libgmock-dev)
-            packages+=(libmd-dev libssl-dev libcrypt-dev)
+            packages+=(libmd-dev libssl-dev libcrypt-dev pkg-config)
             ;;
         bench) packages+=(libbenchmark-dev) ;;
         # llvm brings the symbolizer, without which a finding is a list of addresses.

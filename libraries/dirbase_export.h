@@ -15,6 +15,9 @@
 
 #define DIRBASE_EXPORT __attribute__((visibility("default")))
 
+// Marks a private member of an exported class that only the library's own sources call.
+#define DIRBASE_HIDDEN __attribute__((visibility("hidden")))
+
 // DIRBASE_C_BEGIN, DIRBASE_C_END   stand around what has the linkage of C
 // DIRBASE_ENUM_INT                 behind the name of an enum: its values are held as an int, as C does by itself
 // DIRBASE_NUMBER                   a constant in the range of an int. In C, too, it may be a case label or the size of

@@ -26,15 +26,24 @@ namespace {
 constexpr char list_name[] = "schema.list";
 constexpr char environment_variable[] = "DIRBASE_SCHEMA";
 
-// The schema that came with the tool: beside an installed tool, wherever the installation was moved to; in the source
-// tree of a tool that was built and not installed; and last where the build was configured to install it.
+// Where the link that a build puts next to its tool leads to: the source tree's schema. Empty for an installed tool.
+fs::path linked_folder(const fs::path& tool)
+{
+    std::error_code error;
+    const fs::path link = tool.parent_path() / "schema";
+    const fs::path target = fs::is_symlink(link, error) ? fs::canonical(link, error) : fs::path();
+    return error ? fs::path() : target;
+}
+
+// The schema that came with the tool: beside an installed tool, wherever the installation was moved to; in the
+// source tree of a tool that was built and not installed; and last where the build was configured to install it.
 std::string shipped_folder()
 {
     std::error_code error;
     const fs::path tool = fs::read_symlink("/proc/self/exe", error);
     const fs::path candidates[] = {
         error ? fs::path() : (tool.parent_path() / DIRBASE_RELATIVE_SCHEMA_DIR).lexically_normal(),
-        DIRBASE_SOURCE_SCHEMA_DIR,
+        error ? fs::path() : linked_folder(tool),
         DIRBASE_INSTALLED_SCHEMA_DIR,
     };
     for (const fs::path& candidate : candidates) {

@@ -46,7 +46,7 @@ public:
     static void throw_last_tcpip_error(const char* file, int line);
 
 private:
-    static bool _quiet;
+    DIRBASE_HIDDEN static bool _quiet;
 
     std::int64_t code_;
     const char* file_;

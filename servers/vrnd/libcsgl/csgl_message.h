@@ -46,8 +46,8 @@ public:
     static std::size_t allocation_size(std::size_t n);
 
 private:
-    void take_apart(const char* text, const char* end) noexcept;
-    void add_parameter(const char* start) noexcept;
+    DIRBASE_HIDDEN void take_apart(const char* text, const char* end) noexcept;
+    DIRBASE_HIDDEN void add_parameter(const char* start) noexcept;
 
     unsigned block_size_ = 0;
     int number_ = 0;

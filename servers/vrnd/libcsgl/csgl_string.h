@@ -38,7 +38,7 @@ private:
 
     char* storage() { return capacity_ == 0 ? inline_ : heap_; }
     bool fits(unsigned needed) const { return needed <= (capacity_ == 0 ? inline_size : capacity_); }
-    void use_block(char* block, unsigned capacity);
+    DIRBASE_HIDDEN void use_block(char* block, unsigned capacity);
 
     unsigned capacity_;  // size of the heap block, 0 while the text lies inline
     unsigned length_;
@@ -106,7 +106,7 @@ public:
     friend csgl_string operator+(const csgl_string& a, int b) = delete;
 
 private:
-    csgl_string(const char* text1, unsigned length1, const char* text2, unsigned length2);
+    DIRBASE_HIDDEN csgl_string(const char* text1, unsigned length1, const char* text2, unsigned length2);
 };
 
 // A text to be written to a csgl_output between quotes; a quote inside the text is doubled.

@@ -230,14 +230,14 @@ private:
     {
         return state_ == ldcf_attrtype_state::complete || state_ == ldcf_attrtype_state::db_names_complete;
     }
-    ldcf_attrtype_* link_supertype(const attribute_map& attributes);
-    void begin_completion();
-    void finish_completion(const rule_map& rules, const syntax_map& syntaxes);
-    void inherit();
-    void resolve_syntax(const syntax_map& syntaxes);
-    ldcf_matchrule resolve_rule(const char* keyword, csgl_string& rule, const rule_map& rules) const;
-    void check_encryption();
-    void append_store_form(csgl_string& text) const;
+    DIRBASE_HIDDEN ldcf_attrtype_* link_supertype(const attribute_map& attributes);
+    DIRBASE_HIDDEN void begin_completion();
+    DIRBASE_HIDDEN void finish_completion(const rule_map& rules, const syntax_map& syntaxes);
+    DIRBASE_HIDDEN void inherit();
+    DIRBASE_HIDDEN void resolve_syntax(const syntax_map& syntaxes);
+    DIRBASE_HIDDEN ldcf_matchrule resolve_rule(const char* keyword, csgl_string& rule, const rule_map& rules) const;
+    DIRBASE_HIDDEN void check_encryption();
+    DIRBASE_HIDDEN void append_store_form(csgl_string& text) const;
 
     ldcf_lazy_record<asyntaxinfo, ldcf_rdbm::delete_asyntaxinfo> info_;
     csgl_string v3_file_;

@@ -101,11 +101,12 @@ private:
     friend class ldcf_objclass;
     class completion;
 
-    void read_keyword(ldcf_token_factory& factory, const ldcf_token& token);
-    void set_kind(ldcf_objclass_kind kind);
-    void resolve(const ldcf_map_name_to<ldcf_objclass>& classes, const ldcf_map_name_to<ldcf_attrtype>& attributes);
-    void absorb(const ldcf_objclass& superclass);
-    void finish();
+    DIRBASE_HIDDEN void read_keyword(ldcf_token_factory& factory, const ldcf_token& token);
+    DIRBASE_HIDDEN void set_kind(ldcf_objclass_kind kind);
+    DIRBASE_HIDDEN void resolve(const ldcf_map_name_to<ldcf_objclass>& classes,
+                                const ldcf_map_name_to<ldcf_attrtype>& attributes);
+    DIRBASE_HIDDEN void absorb(const ldcf_objclass& superclass);
+    DIRBASE_HIDDEN void finish();
 
     ldcf_lazy_record<objectclassinfo, ldcf_rdbm::delete_objectclassinfo> info_;
     csgl_string v3_file_;

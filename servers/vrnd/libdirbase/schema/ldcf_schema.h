@@ -110,9 +110,9 @@ struct DIRBASE_EXPORT ldcf_schema {
     csgl_string current_file;  // the file parsed last, the home of new definitions
 
 private:
-    void parse_section(ldcf_token_factory& factory, const ldcf_token& keyword);
+    DIRBASE_HIDDEN void parse_section(ldcf_token_factory& factory, const ldcf_token& keyword);
     template <typename T, typename Map>
-    void replace_in(const char* kind, T& definition, Map& map);
+    DIRBASE_HIDDEN void replace_in(const char* kind, T& definition, Map& map);
 };
 
 extern "C" {

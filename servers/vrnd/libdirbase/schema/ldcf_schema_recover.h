@@ -79,9 +79,9 @@ private:
         bool backup = false;     // under FILE.tmp.old
     };
 
-    ldcf_leftovers judge() const;
-    void put_back();
-    void carry_on();
+    DIRBASE_HIDDEN ldcf_leftovers judge() const;
+    DIRBASE_HIDDEN void put_back();
+    DIRBASE_HIDDEN void carry_on();
 
     csgl_vector<state> states_;
     ldcf_leftovers found_ = ldcf_leftovers::none;

@@ -60,7 +60,7 @@ private:
 
     // Raises any other class at the current place, with the excerpt at hand in the same way.
     template <typename Exception>
-    [[noreturn]] void raise(const char* text, int message_id) const;
+    [[noreturn]] DIRBASE_HIDDEN void raise(const char* text, int message_id) const;
 
     const char* token_start_;
     const char* cursor_;
@@ -93,10 +93,10 @@ public:
     bool is(const char* keyword) const { return csgl_str_ci_compare(text_, keyword) == 0; }
 
 private:
-    void init(ldcf_token_factory& factory);
-    void read_number(ldcf_token_factory& factory);
-    void read_quoted(ldcf_token_factory& factory);
-    void take(ldcf_token_factory& factory, ldcf_token_type type, const char* end);
+    DIRBASE_HIDDEN void init(ldcf_token_factory& factory);
+    DIRBASE_HIDDEN void read_number(ldcf_token_factory& factory);
+    DIRBASE_HIDDEN void read_quoted(ldcf_token_factory& factory);
+    DIRBASE_HIDDEN void take(ldcf_token_factory& factory, ldcf_token_type type, const char* end);
 
     csgl_string text_;
     ldcf_token_type type_;
