@@ -4,7 +4,9 @@
 #include <dlfcn.h>
 #include <gtest/gtest.h>
 
+#include <atomic>
 #include <cerrno>
+#include <cstdio>
 #include <cstdlib>
 #include <new>
 
@@ -20,7 +22,8 @@ struct counters {
     bool failed = false;      // the failing allocation of this run has been met
     unsigned pauses = 0;      // no counting while there are any
     std::size_t seen = 0;     // allocations counted in this run
-    std::size_t failing = 0;  // the one to fail, counted from 1; 0 fails none
+    std::size_t failing = 0;  // the first to fail, counted from 1; 0 fails none
+    bool onwards = false;     // all behind it fail, too
     std::ptrdiff_t live = 0;  // blocks made less blocks released in this run
 };
 
@@ -29,7 +32,11 @@ thread_local constinit counters state;
 // Counts an allocation and says whether it has to fail.
 bool must_fail()
 {
-    if (!state.armed || state.pauses != 0 || ++state.seen != state.failing) {
+    if (!state.armed || state.pauses != 0) {
+        return false;
+    }
+    ++state.seen;
+    if (state.seen != state.failing && !(state.onwards && state.failed)) {
         return false;
     }
     state.failed = true;
@@ -229,10 +236,19 @@ bool allocation_failed()
 
 namespace {
 
+std::atomic<std::size_t> failed_in_all = 0;
+
+// Tells what was tried once the last test is through.
+class tell_total : public testing::Environment {
+public:
+    void TearDown() override { std::printf("%zu failed allocations were tried\n", failed_in_all.load()); }
+};
+const testing::Environment* const total = testing::AddGlobalTestEnvironment(new tell_total);
+
 // One run with the allocation `point` failing; returns what the run has left in the counters.
-counters run(const std::function<void(std::size_t)>& body, std::size_t point)
+counters run(const std::function<void(std::size_t)>& body, std::size_t point, alloc_failures kind)
 {
-    state = counters{.armed = true, .failing = point};
+    state = counters{.armed = true, .failing = point, .onwards = kind == alloc_failures::all_from_there};
     try {
         body(point);
     } catch (...) {
@@ -249,17 +265,18 @@ counters run(const std::function<void(std::size_t)>& body, std::size_t point)
 
 }  // namespace
 
-std::size_t for_each_failing_allocation(const std::function<void(std::size_t point)>& body)
+std::size_t for_each_failing_allocation(const std::function<void(std::size_t point)>& body, alloc_failures kind)
 {
     // A call whose need grows from run to run, because it leaves something behind, would never end.
-    const std::size_t limit = 1000 + 10 * run(body, 0).seen;
+    const std::size_t limit = 1000 + 10 * run(body, 0, kind).seen;
 
     for (std::size_t point = 1; point <= limit; ++point) {
-        const counters result = run(body, point);
+        const counters result = run(body, point, kind);
         if (result.live != 0) {
             ADD_FAILURE() << result.live << " blocks left behind after allocation " << point
                           << (result.failed ? " failed" : " was not reached");
         }
+        failed_in_all += result.failed ? 1 : 0;
         if (!result.failed) {
             EXPECT_GT(point, 1u) << "the body allocates nothing, so no failure was tried";
             return point - 1;

@@ -8,7 +8,8 @@
 //
 // Counters are the thread's own: what other threads allocate is neither counted nor made to fail. So a body starts no
 // thread: what one allocates and another releases looks like a leak. Memory for an exception in flight is never
-// refused, or a throw for quite another reason would count as a failed allocation.
+// refused, or a throw for quite another reason would count as a failed allocation. At its end the program tells how
+// many failures were tried in all.
 //
 //     TEST(DnNormalizeAlloc, EveryFailureGivesNoMemory)
 //     {
@@ -28,6 +29,10 @@
 
 namespace test_support {
 
+// What fails in a run: the one allocation, as when a large block can't be had, or all from that one on, as when memory
+// has run out for good. A caller that tries again with less survives the first kind and not the second.
+enum class alloc_failures : int { one, all_from_there };
+
 // Runs `body` once without failures (point 0), then again and again with its 1st (point 1), 2nd, ... allocation
 // failing, until a run ends without having come to its failing allocation. Returns the number of allocations that
 // failed; none at all is a test failure, since then nothing was shown.
@@ -37,7 +42,8 @@ namespace test_support {
 //
 // A run after the first that leaves more or fewer live blocks on this thread than it found is a test failure that names
 // the point. The first is let off because it fills what is filled once. Not to be nested.
-std::size_t for_each_failing_allocation(const std::function<void(std::size_t point)>& body);
+std::size_t for_each_failing_allocation(const std::function<void(std::size_t point)>& body,
+                                        alloc_failures kind = alloc_failures::one);
 
 // Whether an allocation has failed in this run.
 bool allocation_failed();

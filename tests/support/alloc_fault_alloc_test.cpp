@@ -56,6 +56,23 @@ TEST(AllocFault, EachAllocationFailsOnceAndTheLastRunIsWhole)
     EXPECT_EQ(whole, 2u);
 }
 
+TEST(AllocFault, AllAllocationsFromOneOnFail)
+{
+    std::vector<int> made;
+    made.reserve(10);
+    EXPECT_EQ(3u, for_each_failing_allocation(
+                      [&](std::size_t) {
+                          int count = 0;
+                          for (int i = 0; i < 3; ++i) {
+                              const std::unique_ptr<int> block(new (std::nothrow) int(i));
+                              count += block != nullptr ? 1 : 0;
+                          }
+                          made.push_back(count);
+                      },
+                      test_support::alloc_failures::all_from_there));
+    EXPECT_EQ(made, (std::vector{3, 0, 1, 2, 3}));
+}
+
 TEST(AllocFault, OtherThreadsAndPausesAndExceptionsInFlightAreLeftAlone)
 {
     std::atomic<unsigned> rounds = 0;

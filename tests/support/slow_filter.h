@@ -274,22 +274,32 @@ private:
     // What a tree holds are the normal forms of all values that have one.
     static int test_in_tree(const Attribute& attr, const berval& wanted)
     {
-        const auto node_of = [&](const berval& value) {
+        const auto node_of = [&](const berval& value, int normalize) {
             AttrvalsNorm* node = nullptr;
-            create_normalized_berval_in_attrvalsNorm(&node, &value, syntax_of(attr), 1);
+            create_normalized_berval_in_attrvalsNorm(&node, &value, syntax_of(attr), normalize);
             return std::unique_ptr<AttrvalsNorm, decltype(&free_AttrvalsNorm)>(node, free_AttrvalsNorm);
         };
-        const auto node = node_of(wanted);
+        // A normal form that can't be normalised once more is looked for as it is; only of the digits of a bit string
+        // it is plain that they are one.
+        auto node = node_of(wanted, 1);
+        int otherwise = -1;
+        if (node == nullptr) {
+            const std::string text(wanted.bv_val, wanted.bv_len);
+            const bool digits = syntax_of(attr) == (SC_CIS | SC_BIT_STRING) && !text.empty() &&
+                                text.find_first_not_of("01") == text.npos;
+            otherwise = digits ? -1 : 1;
+            node = node_of(wanted, 0);
+        }
         if (node == nullptr) {
             return 1;
         }
         for (const berval& value : values(attr.a_vals)) {
-            const auto other = node_of(value);
+            const auto other = node_of(value, 1);
             if (other != nullptr && value_cmp_fast(node.get(), other.get()) == 0) {
                 return 0;
             }
         }
-        return -1;
+        return otherwise;
     }
 
     static int test_in_array(const Attribute& attr, const berval& wanted, bool two_way)

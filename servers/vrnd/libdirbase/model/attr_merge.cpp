@@ -9,12 +9,12 @@
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/oid_prefix.h"
 #include "servers/vrnd/libdirbase/model/attr_ids.h"
+#include "servers/vrnd/libdirbase/model/attr_lookup.h"
 #include "servers/vrnd/libdirbase/model/attr_names.h"
 #include "servers/vrnd/libdirbase/model/attr_records.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
 #include "servers/vrnd/libdirbase/model/value_add.h"
-#include "servers/vrnd/libdirbase/schema/ldcf_api.h"
 
 namespace {
 
@@ -26,6 +26,12 @@ void forget_count(Entry& entry, const asyntaxinfo* info)
     } else if (info != nullptr && info->attr_id == attr_id_uniquemember) {
         entry.e_uniquemember_count = -1;
     }
+}
+
+int tell_no_memory(const char* function)
+{
+    debug_error("Error - %s: malloc() failed. Out of memory\n", function);
+    return LDAP_NO_MEMORY;
 }
 
 bool is_numeric_form(const char* name)
@@ -55,8 +61,7 @@ int insert_by_name(Entry& entry, const char* name, const char* tag, asyntaxinfo*
         if (tag != nullptr) {
             made = first_name_with_tag(*info, tag);
             if (made == nullptr) {
-                debug_error("Error - attr_merge: malloc() failed. Out of memory\n");
-                return LDAP_NO_MEMORY;
+                return tell_no_memory("attr_merge");
             }
         }
         name = tag != nullptr ? made.get() : info->names[0];
@@ -106,8 +111,8 @@ int attr_merge(Entry* entry, const char* name, berval** values, int drop_duplica
     if (entry == nullptr || name == nullptr) {
         return LDAP_OTHER;
     }
-    if (info == nullptr) {
-        info = ldcf_api_attr_get_info(name, nullptr);
+    if (info == nullptr && look_up_attr(name, &info) != LDAP_SUCCESS) {
+        return tell_no_memory("attr_merge");
     }
     Attribute* attr = nullptr;
     const int result = attr_merge_record(*entry, name, info, &attr);
@@ -122,8 +127,8 @@ int attr_merge_fast(Entry* entry, const char* name, berval** values, std::int64_
         return LDAP_OTHER;
     }
     if (*attr == nullptr) {
-        if (info == nullptr) {
-            info = ldcf_api_attr_get_info(name, nullptr);
+        if (info == nullptr && look_up_attr(name, &info) != LDAP_SUCCESS) {
+            return tell_no_memory("attr_merge_fast");
         }
         const char* const tag = find_language_tag(name);
         if (is_too_long(tag)) {

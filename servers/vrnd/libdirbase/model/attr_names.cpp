@@ -13,9 +13,9 @@
 #include "servers/vrnd/libdirbase/base/oid_prefix.h"
 #include "servers/vrnd/libdirbase/base/server_globals.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
+#include "servers/vrnd/libdirbase/model/attr_lookup.h"
 #include "servers/vrnd/libdirbase/model/dn_plain.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
-#include "servers/vrnd/libdirbase/schema/ldcf_api.h"
 
 avl_node* attr_syntaxes = nullptr;
 
@@ -134,7 +134,9 @@ bool is_subtype_attr(const char* a, const char* b)
     if (marked && (std::strchr(b, ';') == nullptr || strtagcmp(find_language_tag(a), find_language_tag(b)) != 0)) {
         return false;
     }
-    return ldcf_api_attr_get_info(a, nullptr) == ldcf_api_attr_get_info(b, nullptr);
+    asyntaxinfo* info_a = nullptr;
+    asyntaxinfo* info_b = nullptr;
+    return look_up_attr(a, &info_a) == LDAP_SUCCESS && look_up_attr(b, &info_b) == LDAP_SUCCESS && info_a == info_b;
 }
 
 int verifyAttributeMapping(const char* mapping, char** second, char** first)
@@ -154,7 +156,12 @@ int verifyAttributeMapping(const char* mapping, char** second, char** first)
     }
     removeOIDstr(string_strip_trailing(left.get()));
     removeOIDstr(string_strip_leading(right.get()));
-    if (ldcf_api_attr_get_info(left.get(), nullptr) == nullptr) {
+    asyntaxinfo* info = nullptr;
+    if (look_up_attr(left.get(), &info) != LDAP_SUCCESS) {
+        debug_error("Error - verifyAttributeMapping: malloc() failed. Out of memory\n");
+        return LDAP_NO_MEMORY;
+    }
+    if (info == nullptr) {
         debug_error("verifyAttributeMapping: Attribute '%s' not found in schema.\n", left.get());
         return refuse_mapping(168, left.get());
     }

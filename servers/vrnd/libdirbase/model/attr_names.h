@@ -2,6 +2,8 @@
 //
 // Names compare without regard to ASCII case. What looks a name up in the active schema says so; its caller holds the
 // read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g). Everything else may be called from any thread.
+// Without memory for the look-up (ldcf_api_attr_get_info) a name counts as one that the schema doesn't know, except
+// where another result is told.
 #pragma once
 
 #include <stdbool.h>
@@ -45,7 +47,7 @@ DIRBASE_EXPORT bool attr_selected(const char* name, char** list);
 
 // Whether the first name is the attribute of the second, or a version of it: false when only the first has a ";",
 // and when both have one and the tags differ. Looks both up; two names that the schema doesn't know count as one
-// attribute.
+// attribute. False without memory.
 DIRBASE_EXPORT bool is_subtype_attr(const char* a, const char* b);
 
 // Checks a mapping: two names joined by "$", the first of them in the schema, which is looked up, the second

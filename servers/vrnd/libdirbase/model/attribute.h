@@ -7,7 +7,8 @@
 // An entry, its attributes and their values are changed by one thread at a time; while nobody changes them any number
 // of threads may read. Calls are made under the read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g), to
 // which the schema records belong. Where a schema record may be given it is the one of the name, and null has
-// the name looked up.
+// the name looked up. What finds and removes treats a name that there is no memory to look up (ldcf_api_attr_get_info)
+// as one that the schema doesn't know; what adds says LDAP_NO_MEMORY.
 #pragma once
 
 #include <stdint.h>

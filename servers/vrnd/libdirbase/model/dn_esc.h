@@ -165,7 +165,8 @@ DIRBASE_EXPORT const char* find_end_attr_value33(const char** start, const char*
 // memory.
 DIRBASE_EXPORT char* normAttrValue(const char* value, int* error);
 
-// The schema's first name, the shortest, of an attribute by any name or OID, and its record; null for an unknown one.
+// The schema's first name, the shortest, of an attribute by any name or OID, and its record; null for an unknown one,
+// and without memory for its record.
 // The name belongs to the record.
 DIRBASE_EXPORT const char* FirstRDNType_and_syntax(const char* type, asyntaxinfo** info);
 
@@ -184,7 +185,8 @@ DIRBASE_EXPORT char* BuildDNString33(ldap_escDN* dn);
 
 // Builds the upper text of a record that BuildDNString33 has built, and returns it; it stays the record's. Bytes that
 // can't be folded give internal error DN_ERR_UTF8; the text is then not to be used. Null when memory ran out, with
-// DN_ERR_NO_MEMORY. A record with an internal error or without RDNs keeps its upper text, which is returned.
+// DN_ERR_NO_MEMORY and the old text. A record with an internal error or without RDNs keeps its upper text, which is
+// returned.
 DIRBASE_EXPORT char* dn_upcase_esc(ldap_escDN* dn);
 
 // Writes the pairs of one RDN as the upper text has them, "+" between them, and a terminator, to which *out moves.

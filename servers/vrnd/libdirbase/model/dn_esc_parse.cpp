@@ -9,11 +9,11 @@
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libmsg/message_log.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
+#include "servers/vrnd/libdirbase/model/attr_lookup.h"
 #include "servers/vrnd/libdirbase/model/dn_chars.h"
 #include "servers/vrnd/libdirbase/model/dn_esc_records.h"
 #include "servers/vrnd/libdirbase/model/dn_scan.h"
 #include "servers/vrnd/libdirbase/model/dn_sort.h"
-#include "servers/vrnd/libdirbase/schema/ldcf_api.h"
 
 using dn_chars::is;
 
@@ -140,7 +140,10 @@ private:
     bool look_up(const char* written, bool numeric)
     {
         asyntaxinfo* info = nullptr;
-        name_ = FirstRDNType_and_syntax(written, &info);
+        if (look_up_attr(written, &info) != LDAP_SUCCESS) {
+            return fail(DN_ERR_NO_MEMORY);
+        }
+        name_ = info == nullptr ? nullptr : info->names[0];
         if (name_ == nullptr) {
             debug_error("attribute %s is not defined in the schema\n", written);
             PrintMessage(MSG_COMPONENT_RDBM, MSG_SEVERE, 13, written);

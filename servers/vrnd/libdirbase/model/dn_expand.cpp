@@ -7,10 +7,10 @@
 #include "libraries/libber/ldap_result.h"
 #include "libraries/libmsg/debug_log.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
+#include "servers/vrnd/libdirbase/model/attr_lookup.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/dn_esc.h"
 #include "servers/vrnd/libdirbase/model/dn_plain.h"
-#include "servers/vrnd/libdirbase/schema/ldcf_api.h"
 
 namespace {
 
@@ -25,7 +25,11 @@ bool has_dn(const Entry* entry)
 
 int add_attr_to_entry_and_checkdup(Entry* entry, const char* type, char* text)
 {
-    asyntaxinfo* const info = ldcf_api_attr_get_info(type, nullptr);
+    asyntaxinfo* info = nullptr;
+    if (look_up_attr(type, &info) != LDAP_SUCCESS) {
+        debug_error("Error - add_attr_to_entry_and_checkdup: malloc() failed. Out of memory\n");
+        return LDAP_NO_MEMORY;
+    }
     if (info == nullptr) {
         debug_error("Error - add_attr_to_entry_and_checkdup: ldcf_api_attr_get_info() failed.\n");
         return LDAP_OTHER;

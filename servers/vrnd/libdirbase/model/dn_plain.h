@@ -52,7 +52,8 @@ DIRBASE_EXPORT char* dn_normalize_compound_RDN(char* dn);
 DIRBASE_EXPORT char* dn_upcase(char* text);
 
 // The order by strcmp of two DNs after dn_normalize_case (which uses the schema), both left as they are; -1 for a null
-// text and without memory.
+// text and without memory for copies. An RDN whose pairs there is no memory to put in order is compared as it is
+// written, so equal DNs may count as different then.
 DIRBASE_EXPORT int dn_compare(const char* a, const char* b);
 
 // Remove spaces, line feeds and carriage returns from the start, or from the end. A blank that a backslash escapes
@@ -64,7 +65,7 @@ DIRBASE_EXPORT char* string_strip_trailing(char* text);
 // ------------------------------------------------------------------------------------------------
 
 // The shortest among the names and the OID of an attribute, the earliest of equally short ones; it belongs to the
-// schema. Null when the active schema doesn't know it.
+// schema. Null when the active schema doesn't know it, and without memory for its record.
 //
 //   temporary  set to 1 when the attribute's record has to be dropped after use (ldcf_api_attrtype_reset_info); records
 //              here live with their definitions, so it is always 0. May be null.

@@ -18,12 +18,12 @@
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libpwd/pwd_format.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
+#include "servers/vrnd/libdirbase/model/attr_lookup.h"
 #include "servers/vrnd/libdirbase/model/attr_records.h"
 #include "servers/vrnd/libdirbase/model/dn_esc.h"
 #include "servers/vrnd/libdirbase/model/entry_text.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
 #include "servers/vrnd/libdirbase/model/record_guards.h"
-#include "servers/vrnd/libdirbase/schema/ldcf_api.h"
 
 namespace {
 
@@ -171,20 +171,22 @@ private:
     {
         type_ = parts.type;
         type_length_ = parts.type_length;
-        return merged(attr_merge_record(entry_, type_, info_of(parts.type), &attr_));
+        asyntaxinfo* info = nullptr;
+        const int result = look_up(parts.type, &info);
+        return merged(result != LDAP_SUCCESS ? result : attr_merge_record(entry_, type_, info, &attr_));
     }
 
     // A name with a language tag is looked up without it, which needs no memory.
-    static asyntaxinfo* info_of(char* type)
+    static int look_up(char* type, asyntaxinfo** info)
     {
         char* const mark = std::strchr(type, ';');
         if (mark == nullptr || find_language_tag(type) != mark + 1) {
-            return ldcf_api_attr_get_info(type, nullptr);
+            return look_up_attr(type, info);
         }
         *mark = '\0';
-        asyntaxinfo* const info = ldcf_api_attr_get_info(type, nullptr);
+        const int result = look_up_attr(type, info);
         *mark = ';';
-        return info;
+        return result;
     }
 
     // Of an encrypted attribute duplicates are looked for within one addition only, and "default" decides for all

@@ -183,7 +183,9 @@ int find_in_tree(const Attribute& attr, const berval& wanted, std::uint32_t synt
     int found = value_find(&attr, &wanted, syntax, 1);
     if (found != 0 && found != 1 && (syntax & SC_CIS) != 0) {
         found = value_find(&attr, &wanted, syntax, 0);
-        if (found == 1 && (syntax & SC_BIT_STRING) == 0) {
+        const bool is_normal = (syntax & SC_BIT_STRING) != 0 && wanted.bv_len != 0 &&
+                               text_of(wanted).find_first_not_of("01") == std::string_view::npos;
+        if (found == 1 && !is_normal) {
             return LDAP_OPERATIONS_ERROR;
         }
     }

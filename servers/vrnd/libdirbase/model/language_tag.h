@@ -36,7 +36,7 @@ DIRBASE_EXPORT int parse_language_tags(const char* name, char** base, char** tag
                                        int allocate DIRBASE_DEFAULT(0));
 
 // The same into a buffer of language_tag_buffer bytes (may be null in mode LANGUAGE_BASE), which holds the empty text
-// when there is no tag. `tag_length`, unless null, takes the length of what it holds.
+// when there is no tag and after a failure. `tag_length`, unless null, takes the length of what it holds.
 DIRBASE_EXPORT int parse_language_tags_with_buffer(const char* name, char** base, char* tag, size_t* tag_length,
                                                    int mode);
 

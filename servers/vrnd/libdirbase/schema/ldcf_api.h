@@ -37,7 +37,8 @@ DIRBASE_EXPORT int ldcf_api_schema_parse(const char* file);
 // Links and checks the active schema. Returns 0, or 1 for a schema that can't be used.
 DIRBASE_EXPORT int ldcf_api_schema_complete(void);
 
-// Works out the names in the store, when the back ends are known, and fills the name cache. Returns 0 or 1.
+// Works out the names in the store, when the back ends are known, and fills the name cache. Returns 0 or 1. Names that
+// the cache has no memory for are found without it.
 DIRBASE_EXPORT int ldcf_api_schema_complete_db_names(void);
 
 // ---- the schemas and their lock -----------------------------------------------------------------------------------
@@ -74,7 +75,8 @@ DIRBASE_EXPORT int add_attr_to_entry(Entry* entry, const char* type, const char*
 
 // The record of an attribute type by name or OID, with or without "oid." in front, a language tag or ";binary" behind
 // (the latter for types of binary syntax only). Null for a name that the schema lacks, a null or empty name, and a type
-// that can't have a record.
+// that can't have a record; and without memory for a record that wasn't made yet, or for the name without what stands
+// behind it. Memory that ran out leaves errno at ENOMEM.
 //
 //   base_out  may be null. For a name that the cache doesn't hold it receives the name without its language tags, a
 //             text for the caller to free(), or null when it has none, its tags are too long (240 bytes) or memory ran
@@ -96,7 +98,8 @@ DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info_from_proposed_schema(const ch
 // regard to case; null when there is none.
 DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info_based_on_table(const char* table);
 
-// The record of an object class by name or OID; null when the schema lacks it.
+// The record of an object class by name or OID; null when the schema lacks it, and without memory for a record that
+// wasn't made yet.
 DIRBASE_EXPORT objectclassinfo* ldcf_api_objectclass_get_info(const char* name);
 
 // Calls a function with the record of every attribute type, once each. Returns 0, or 80 when a type has no record or
