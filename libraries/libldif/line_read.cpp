@@ -15,7 +15,8 @@ bool is_white_space(char c)
     return c == ' ' || (c >= '\t' && c <= '\r');
 }
 
-// The next line feed, or the zero byte at the end. Where that is isn't known, so the search goes on by a window at a time.
+// The next line feed, or the zero byte at the end. Where that is isn't known, so the search goes on by a window at a
+// time.
 char* find_line_feed(char* from)
 {
     constexpr std::size_t window = 128;

@@ -1,5 +1,5 @@
-// The command line of `dirbase` in its parts: what the groups of commands have in common, and the groups that aren't set
-// up in main.cpp.
+// The command line of `dirbase` in its parts: what the groups of commands have in common, and the groups that aren't
+// set up in main.cpp.
 #pragma once
 
 #include <CLI/CLI.hpp>

@@ -14,8 +14,8 @@ class csgl_output;
 
 class DIRBASE_EXPORT exc_t {
 public:
-    // Builds the message and logs it with severity 8. When there is no memory for that, exc_not_enough_memory_t comes in
-    // place of the exception.
+    // Builds the message and logs it with severity 8. When there is no memory for that, exc_not_enough_memory_t comes
+    // in place of the exception.
     //
     //   file, line  the raising place; the text of file is kept, not copied. For a fault in schema text it is the name
     //               of the source, which lives as long as the source's reader: a handler further up must not use it.

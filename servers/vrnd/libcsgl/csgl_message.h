@@ -27,8 +27,8 @@ public:
     bool try_init(const char* text, unsigned length, int number, const char* file, int line) noexcept;
 
     // Writes the message to the message log and keeps its rendering, unless the number is 0. A number below 0 names a
-    // catalogue text with the parameters alone, one above 0 a text with place and line ahead of them. Called once, after
-    // the message was taken apart.
+    // catalogue text with the parameters alone, one above 0 a text with place and line ahead of them. Called once,
+    // after the message was taken apart.
     void log(int severity, int catalogue);
 
     const char* text() const { return text_; }

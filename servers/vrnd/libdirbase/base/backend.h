@@ -6,9 +6,12 @@
 #include "libraries/dirbase_export.h"
 
 typedef struct asyntaxinfo asyntaxinfo;
+typedef struct Backend Backend;
+
+// Gives a text of a back end.
+typedef const char* (*backend_text_function)(Backend* be);
 
 // Texts and functions belong to whoever fills the record; a function pointer may be null.
-typedef struct Backend Backend;
 struct Backend {
     // Suffixes, each the upper text of dn_normalize_esc; ended by a null pointer.
     char** be_suffix DIRBASE_DEFAULT(nullptr);
@@ -18,8 +21,8 @@ struct Backend {
 
     // What stands in front of the names of a relational store's tables, for example their owner, and the table that
     // holds entry-level attributes. The texts stay with the back end; null stands for none, and for LDAP_ENTRY.
-    const char* (*be_table_qualifier)(Backend* be) DIRBASE_DEFAULT(nullptr);
-    const char* (*be_entry_table)(Backend* be) DIRBASE_DEFAULT(nullptr);
+    backend_text_function be_table_qualifier DIRBASE_DEFAULT(nullptr);
+    backend_text_function be_entry_table DIRBASE_DEFAULT(nullptr);
 
     // May add to the record of an attribute type that has just been made, before anybody else sees it. It may run in
     // any look-up, before index_action and the four members about protection are filled, while other threads wait to

@@ -307,7 +307,8 @@ int read_substrings(const filter_source& from, filter_substrings& pieces)
 
 int read_filter(const filter_source& from, unsigned depth, filter_guard& filter);
 
-// Reads the members of the set at the position, `depth` levels down. There are none when one of them makes it undefined.
+// Reads the members of the set at the position, `depth` levels down. There are none when one of them makes it
+// undefined.
 int read_list(const filter_source& from, std::uint64_t choice, unsigned depth, filter_list& members)
 {
     const ber_scope inside(from.ber);

@@ -24,8 +24,8 @@
 #include "servers/vrnd/libdirbase/model/attr_value_tree.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/entry_text.h"
-#include "servers/vrnd/libdirbase/model/filter_guards.h"
 #include "servers/vrnd/libdirbase/model/filter_evaluation.h"
+#include "servers/vrnd/libdirbase/model/filter_guards.h"
 #include "servers/vrnd/libdirbase/model/value_normalize.h"
 #include "servers/vrnd/str2filter.h"
 

@@ -9,8 +9,8 @@
 
 #include "fuzz/support/fuzz_support.h"
 #include "servers/vrnd/libdirbase/base/server_globals.h"
-#include "servers/vrnd/libdirbase/model/filter_guards.h"
 #include "servers/vrnd/libdirbase/model/filter_evaluation.h"
+#include "servers/vrnd/libdirbase/model/filter_guards.h"
 #include "servers/vrnd/str2filter.h"
 #include "tests/support/slow_filter.h"
 
