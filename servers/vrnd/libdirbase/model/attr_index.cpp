@@ -63,7 +63,6 @@ bool attr_index::remove(const Attribute& attr) noexcept
     }
     versions& left = of_key->second;
     const auto version = left.by_tag.find(find_language_tag(attr.a_type));
-    // The text of a key or a tag may be this record's and stand for other versions, too.
     if (version == left.by_tag.end() || version->second != &attr) {
         return false;
     }
@@ -75,5 +74,6 @@ bool attr_index::remove(const Attribute& attr) noexcept
     if (left.lowest == &attr) {
         left.lowest = attr.a_sorted_next;  // the records of a key stand side by side
     }
+    // The text of the key may be this record's, and stand for the versions that are left.
     return of_key->first != attr.a_type;
 }

@@ -9,18 +9,17 @@
 
 #include <benchmark/benchmark.h>
 
-#include <atomic>
 #include <cstdlib>
 #include <cstring>
 #include <memory>
 #include <random>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "bench/support/allocation_count.h"
 #include "bench/support/generated_schema.h"
 #include "bench/support/timing.h"
+#include "bench/support/two_threads.h"
 #include "servers/vrnd/libdirbase/model/attr_value_tree.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/entry_text.h"
@@ -269,38 +268,13 @@ void BM_TestFilterThreads(benchmark::State& state)
     for (const substring_filter& wanted : substring_filters) {
         filters.push_back(filter_of(wanted.text));
     }
-    const auto time_of = [&](std::size_t threads) {
-        std::atomic<std::size_t> waiting{threads};
-        const auto tester = [&] {
-            --waiting;
-            while (waiting != 0) {}
-            for (std::size_t i = 0; i < rounds; ++i) {
-                for (const filter_guard& filter : filters) {
-                    benchmark::DoNotOptimize(count_matches(entries, filter.get()));
-                }
+    bench_support::measure_two_threads(state, [&] {
+        for (std::size_t i = 0; i < rounds; ++i) {
+            for (const filter_guard& filter : filters) {
+                benchmark::DoNotOptimize(count_matches(entries, filter.get()));
             }
-        };
-        return bench_support::elapsed_seconds_of([&] {
-            std::vector<std::thread> others;
-            for (std::size_t i = 1; i < threads; ++i) {
-                others.emplace_back(tester);
-            }
-            tester();
-            for (std::thread& other : others) {
-                other.join();
-            }
-        });
-    };
-    best_time one;
-    best_time two;
-    for (auto _ : state) {
-        one.add(time_of(1));
-        const double seconds = time_of(2);
-        state.SetIterationTime(seconds);
-        two.add(seconds);
-    }
-    state.counters["speedup"] = 2 * one.seconds() / two.seconds();
-    state.counters["goal"] = 1.8;
+        }
+    });
 }
 BENCHMARK(BM_TestFilterThreads)->Iterations(5)->UseManualTime();
 

@@ -6,16 +6,15 @@
 // sides begin to wait for memory.
 #include <benchmark/benchmark.h>
 
-#include <atomic>
 #include <random>
 #include <string>
-#include <thread>
 #include <unordered_map>
 #include <vector>
 
 #include "bench/support/allocation_count.h"
 #include "bench/support/generated_schema.h"
 #include "bench/support/timing.h"
+#include "bench/support/two_threads.h"
 #include "servers/vrnd/libdirbase/base/utf8_text.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_api.h"
 
@@ -153,36 +152,11 @@ void BM_AttrGetInfoThreads(benchmark::State& state)
 {
     const active_schema schema(static_cast<schema_kind>(state.range(0)));
     const std::size_t rounds = 4'000'000 / schema.names().size();
-    const auto time_of = [&](std::size_t threads) {
-        std::atomic<std::size_t> waiting{threads};
-        const auto reader = [&] {
-            --waiting;
-            while (waiting != 0) {}
-            for (std::size_t i = 0; i < rounds; ++i) {
-                look_up(schema.names());
-            }
-        };
-        return bench_support::elapsed_seconds_of([&] {
-            std::vector<std::thread> others;
-            for (std::size_t i = 1; i < threads; ++i) {
-                others.emplace_back(reader);
-            }
-            reader();
-            for (std::thread& other : others) {
-                other.join();
-            }
-        });
-    };
-    best_time one;
-    best_time two;
-    for (auto _ : state) {
-        one.add(time_of(1));
-        const double seconds = time_of(2);
-        state.SetIterationTime(seconds);
-        two.add(seconds);
-    }
-    state.counters["speedup"] = 2 * one.seconds() / two.seconds();
-    state.counters["goal"] = 1.8;
+    bench_support::measure_two_threads(state, [&] {
+        for (std::size_t i = 0; i < rounds; ++i) {
+            look_up(schema.names());
+        }
+    });
 }
 BENCHMARK(BM_AttrGetInfoThreads)->ArgName("large")->Arg(shipped)->Arg(large)->Iterations(5)->UseManualTime();
 
