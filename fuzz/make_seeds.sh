@@ -1,16 +1,16 @@
 #!/usr/bin/env bash
-# Makes the seeds of the fuzzers again, those of the schema's from the shipped schema; run it when the schema or a grammar
-# changed.
+# Makes the seeds of the fuzzers again, those of the schema's from the shipped schema; run it when the schema or a
+# grammar changed.
 #
 #   fuzz/make_seeds.sh
 #
 # parse_str_fuzz gets one definition of each shape (the sequence of its keywords), with the extended one that belongs to
-# it. token_fuzz gets the beginnings of some files, stream_fuzz one text for each reader, time_fuzz one for each form, and
-# the fuzzers of DNs a DN a line.
+# it. token_fuzz gets the beginnings of some files, stream_fuzz one text for each reader, time_fuzz one for each form,
+# the fuzzers of DNs a DN a line, and cfg_fuzz configurations, each behind a base and a filter.
 set -euo pipefail
 cd "$(dirname "$0")"
 schema=../share/schema
-fuzzers=(parse_str_fuzz token_fuzz stream_fuzz time_fuzz dn_normalize_esc_fuzz dn_plain_fuzz)
+fuzzers=(parse_str_fuzz token_fuzz stream_fuzz time_fuzz dn_normalize_esc_fuzz dn_plain_fuzz cfg_fuzz)
 rm -rf "${fuzzers[@]/#/corpus/}"
 mkdir -p "${fuzzers[@]/#/corpus/}"
 
@@ -124,3 +124,32 @@ cn=,x=\\ ,c="\<\=\>;+"
 xan-kerberosname=abc,name=#41 ,cn=a\b
 a.b@c.d
 END
+
+cat >corpus/cfg_fuzz/server <<'END'
+cn=Schemas; CN = configuration
+(xan-vrndIncludeSchema=/etc/V3.\2A)
+# A comment
+ that goes on
+dn: cn=XAN Directory, cn=Schemas, cn=Configuration
+xan-vrndIncludeSchema: /etc/V3.*
+XAN-vrndIncludeSchema: /etc/schema/a path so long
+  that it goes on in the next line
+description:: w6TDtsO8
+
+dn: cn=Configuration
+objectClass: top
+xan-vrndAdminPW: {AES256}9f0uKcqR
+
+dn: cn=Schemas, cn=Configuration
+END
+cat >corpus/cfg_fuzz/names <<'END'
+o=b
+cn=*
+dn:: Y249YQ==
+sn:
+
+dn: cn="y,o=b" + sn=\2C\" ; o=b
+cn::  IHgKeQ==
+cn:< file
+END
+printf '%b' '\nobjectclass=*\nDN: cn=a\r\ncn:  x \r\n  y\r\n\r\ndn: cn = A\r\n' >corpus/cfg_fuzz/twice

@@ -19,7 +19,8 @@
 #define DIRBASE_HIDDEN __attribute__((visibility("hidden")))
 
 // DIRBASE_C_BEGIN, DIRBASE_C_END   stand around what has the linkage of C
-// DIRBASE_ENUM_INT                 behind the name of an enum: its values are held as an int, as C does by itself
+// DIRBASE_ENUM_INT                 behind the name of an enum: its values are held in 32 bits, as an int; in C the
+//                                  compiler may take unsigned
 // DIRBASE_NUMBER                   a constant in the range of an int. In C, too, it may be a case label or the size of
 //                                  an array; its type there is int
 // DIRBASE_CONSTANT                 any other constant; in C it is a variable

@@ -65,7 +65,8 @@ DIRBASE_EXPORT int avl_dup_error(void* stored, void* added);
 DIRBASE_EXPORT int avl_dup_ok(void* stored, void* added);
 
 // Takes the object out of the tree that compares equal to `data`. Returns the stored pointer, which is the caller's as
-// ever, or null when there is none. The objects that stay may move to other nodes.
+// ever, or null when there is none, or when the tree is damaged on the way (message 106). The objects that stay may
+// move to other nodes.
 DIRBASE_EXPORT void* avl_delete(avl_node** root, const void* data, avl_cmp cmp);
 
 // Returns the stored object that compares equal to `data`, or null.

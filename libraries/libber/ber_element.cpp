@@ -1,11 +1,21 @@
 // Making and releasing BER elements.
 #include "libraries/libber/ber_element.h"
 
+#include <cstddef>
 #include <cstdlib>
 
 #include "libraries/libber/ber_state.h"
 
+// Callers have the record on their stacks and look at these places.
+static_assert(offsetof(BerElement, ber_options) == 0 && offsetof(BerElement, ber_buf) == 8 &&
+              offsetof(BerElement, ber_ptr) == 16 && offsetof(BerElement, ber_end) == 24 && sizeof(BerElement) == 848);
+
 namespace {
+
+bool is_readable(const berval* value)
+{
+    return value != nullptr && (value->bv_val != nullptr || value->bv_len == 0);
+}
 
 // Sets all but the starts of open constructions, which are there only as far as something is open.
 void set_up(BerElement& ber, int options, unsigned state, char* bytes, std::size_t length)
@@ -43,7 +53,7 @@ int ber_init2(const berval* value, int options, BerElement* ber)
         return -1;
     }
     set_up(*ber, options, 0, nullptr, 0);
-    if (value == nullptr || (value->bv_val == nullptr && value->bv_len != 0)) {
+    if (!is_readable(value)) {
         return -1;
     }
     set_up(*ber, options, ber_reads, value->bv_val, value->bv_len);
@@ -52,18 +62,17 @@ int ber_init2(const berval* value, int options, BerElement* ber)
 
 BerElement* ber_init(const berval* value)
 {
-    if (value == nullptr || (value->bv_val == nullptr && value->bv_len != 0)) {
+    if (!is_readable(value)) {
         return nullptr;
     }
     auto* ber = static_cast<BerElement*>(std::malloc(sizeof(BerElement)));
-    berval* copy = ber_bvdup(value);
-    if (ber == nullptr || copy == nullptr) {
-        ber_bvfree(copy);
+    char* bytes = ber_copy_bytes(*value);
+    if (ber == nullptr || bytes == nullptr) {
+        std::free(bytes);
         std::free(ber);
         return nullptr;
     }
-    set_up(*ber, 0, ber_reads | ber_owns_record | ber_owns_buffer, copy->bv_val, copy->bv_len);
-    std::free(copy);  // the bytes are the element's now
+    set_up(*ber, 0, ber_reads | ber_owns_record | ber_owns_buffer, bytes, value->bv_len);
     return ber;
 }
 
@@ -86,7 +95,8 @@ int ber_flatten(const BerElement* ber, berval** value)
         return -1;
     }
     *value = nullptr;
-    if (ber == nullptr || !ber_is(*ber, ber_writes) || ber_is(*ber, ber_has_failed) || ber->ber_open != 0) {
+    if (ber == nullptr || !ber_is(*ber, ber_writes) || ber_is(*ber, ber_has_failed) || ber->ber_open != 0 ||
+        ber->ber_tag != 0) {
         return -1;
     }
     const berval written = {static_cast<unsigned long>(ber->ber_ptr - ber->ber_buf), ber->ber_buf};

@@ -7,8 +7,9 @@
 //
 // An element either writes (ber_alloc, ber_alloc_t, fber_alloc) or reads (ber_init, ber_init2, fber_init2); the calls
 // of the other kind fail on it. It is used by one thread at a time; different elements have nothing in common. Nothing
-// here throws or logs, and no allocation failure and no input ends in more than an error result. All memory that
-// changes hands is of malloc.
+// here throws or logs, and no allocation failure and no input ends in more than an error result; a null element, format
+// or place for a result is an error, too, but no letter of a format takes a null place. A call that memory ran out in
+// leaves errno at ENOMEM, and other failures leave errno as it was. All memory that changes hands is of malloc.
 #pragma once
 
 #include <stddef.h>
@@ -76,7 +77,8 @@ DIRBASE_EXPORT BerElement* ber_alloc_t(int options);
 //   value    its bytes are borrowed: they stay where they are, unchanged, as long as the element is read. An empty one
 //            is legal.
 //   options  becomes its ber_options.
-//   ber      a record of any content. ber_free may be called for it and doesn't have to be.
+//   ber      a record of any content, but none that ber_alloc, ber_alloc_t or ber_init made: that would be lost, as
+//            ber_free no longer knew it for its own. ber_free may be called for the record and doesn't have to be.
 //
 // Returns 0, or -1 when an argument is null or the value has a length and no bytes; then the record reads nothing.
 DIRBASE_EXPORT int ber_init2(const berval* value, int options, BerElement* ber);
@@ -110,9 +112,10 @@ DIRBASE_EXPORT void ber_free(BerElement* ber, int free_buffer);
 // Texts and bytes are borrowed for the call. A berval without bv_val is written as the empty one, as ber_bvdup copies
 // it.
 //
-// Returns 0, or -1: no memory, a null text or berval, null bytes with a length, a closing without an opening, more than
-// LBER_MAX_OPEN open, a tag that is 0 or not one whole byte (its low five bits all set), another letter, an element
-// that reads. Once it has failed an element only fails; it is still to be released.
+// Returns 0, or -1: no memory, a null text or berval, null bytes with a length, a closing without an opening or behind
+// a "t" that nothing followed, more than LBER_MAX_OPEN open, a tag that is 0 or not one whole byte (its low five bits
+// all set), another letter, an element that reads. Once it has failed an element only fails; it is still to be
+// released.
 DIRBASE_EXPORT int ber_printf(BerElement* ber, const char* format, ...);
 DIRBASE_EXPORT int ber_printf_w(BerElement* ber, const char* format, ...);  // the same; all texts are UTF-8 in both
 
@@ -120,7 +123,8 @@ DIRBASE_EXPORT int ber_printf_w(BerElement* ber, const char* format, ...);  // t
 //
 //   value  receives the copy, for the caller to release with ber_bvfree; null on failure.
 //
-// Returns 0, or -1: no memory, something still open or failed, a null argument, an element that reads.
+// Returns 0, or -1: no memory, something still open or failed, a "t" that nothing followed, a null argument, an element
+// that reads.
 DIRBASE_EXPORT int ber_flatten(const BerElement* ber, berval** value);
 
 // ---- reading --------------------------------------------------------------------------------------------------------
@@ -142,7 +146,10 @@ DIRBASE_EXPORT int ber_flatten(const BerElement* ber, berval** value);
 //                                        when this call has opened nothing: a sequence of texts is "{v}"
 //   V        berval***                   the same of bervals, for ber_bvecfree
 //   n                                    NULL
-//   { }  [ ]                             enters a construction; leaves it, passing over what is unread in it
+//   { }  [ ]                             enters a construction; leaves it, passing over what is unread in it. Both
+//                                        enter SEQUENCE, SET and whatever has a tag that isn't universal, also one
+//                                        of the primitive form, since some write constructions so: a caller to whom
+//                                        that is a fault looks at the tag first
 //   t        ber_tag_t*                  the tag of the next value, which stays to be read
 //   T        ber_tag_t*                  the same, and the position moves behind the tag and the length
 //   l        ber_len_t*                  the length of the next value, which stays to be read
@@ -150,13 +157,13 @@ DIRBASE_EXPORT int ber_flatten(const BerElement* ber, berval** value);
 //
 // Within a construction that this call entered nothing is read beyond its end. One left open stays entered, and its
 // closing in a later call moves nothing: it is for the caller to have read it all. Texts, numbers and so on are read
-// under any primitive tag that isn't universal; a universal one has to be theirs. Both brackets enter both SEQUENCE and
-// SET.
+// under any primitive tag that isn't universal; a universal one has to be theirs. Numbers needn't be in the fewest
+// bytes.
 //
 // Returns the tag read last (0 for a format that reads none), or LBER_ERROR: what is there isn't what the letter asks,
 // no memory, more than LBER_MAX_OPEN open, a letter that isn't listed, an element that writes. After a failure the
 // position is where it was before the call, what the call allocated is released, and all pointers that the format would
-// have filled, up to a letter that isn't listed, are null; numbers may have been set.
+// have filled, up to a letter that isn't listed, are null; numbers and the buffer of an "s" may have been written.
 DIRBASE_EXPORT ber_tag_t ber_scanf(BerElement* ber, const char* format, ...);
 DIRBASE_EXPORT ber_tag_t ber_scanf_w(BerElement* ber, const char* format,
                                      ...);  // the same; all texts are UTF-8 in both
@@ -167,13 +174,14 @@ DIRBASE_EXPORT ber_tag_t ber_scanf_w(BerElement* ber, const char* format,
 DIRBASE_EXPORT ber_tag_t ber_peek_tag(const BerElement* ber, ber_len_t* len);
 DIRBASE_EXPORT ber_tag_t ber_skip_tag(BerElement* ber, ber_len_t* len);
 
-// Walk through a construction: ber_first_element enters it, both return the tag of the member at the position and set
-// *len to its length. The caller reads each member whole before asking for the next.
+// Walk through a construction: ber_first_element enters it (what "{" enters), both return the tag of the member at the
+// position and set *len to its length. The caller reads each member whole before asking for the next.
 //
 //   last  set by ber_first_element to the construction's end, handed to ber_next_element.
 //
-// LBER_DEFAULT is the end of the construction. LBER_ERROR: no construction is here (ber_first_element), or what is here
-// isn't a member that ends within it; the position is where it was before the call.
+// LBER_DEFAULT is the end of the construction; *len stays as it was. LBER_ERROR: no construction is here
+// (ber_first_element), or what is here isn't a member that ends within it; the position, *len and *last are as they
+// were before the call.
 //
 //     char* last;
 //     for (tag = ber_first_element(ber, &len, &last); tag != LBER_DEFAULT; tag = ber_next_element(ber, &len, last))
@@ -195,7 +203,7 @@ DIRBASE_EXPORT void fber_free(BerElement* ber, int free_buffer);
 //   text  receives a new block with a zero behind the bytes, for the caller to free(); null on failure.
 //   len   receives the number of bytes, without that zero; 0 on failure.
 //
-// Returns the tag, or LBER_ERROR as ber_scanf does, with the position unmoved.
+// Returns the tag, or LBER_ERROR as ber_scanf does and when one of the places is null, with the position unmoved.
 DIRBASE_EXPORT ber_tag_t fber_get_string_len(BerElement* ber, char** text, ber_len_t* len);
 
 DIRBASE_C_END

@@ -160,18 +160,6 @@ bool read_boolean(cursor& from, int* truth)
     return true;
 }
 
-char* copy_bytes(const berval& content)
-{
-    auto* copy = static_cast<char*>(std::malloc(content.bv_len + 1));
-    if (copy != nullptr) {
-        if (content.bv_len != 0) {
-            std::memcpy(copy, content.bv_val, content.bv_len);
-        }
-        copy[content.bv_len] = '\0';
-    }
-    return copy;
-}
-
 bool has_zero(const berval& content)
 {
     return content.bv_len != 0 && std::memchr(content.bv_val, '\0', content.bv_len) != nullptr;
@@ -184,7 +172,7 @@ bool read_copy(cursor& from, char** copy)
     if (!from.take(kind::text, &content) || has_zero(content)) {
         return false;
     }
-    *copy = copy_bytes(content);
+    *copy = ber_copy_bytes(content);
     return *copy != nullptr;
 }
 
@@ -204,7 +192,7 @@ bool read_bytes(cursor& from, berval* copy)
     if (!from.take(kind::text, &content)) {
         return false;
     }
-    char* bytes = copy_bytes(content);
+    char* bytes = ber_copy_bytes(content);
     if (bytes == nullptr) {
         return false;
     }
@@ -455,23 +443,26 @@ ber_tag_t ber_first_element(BerElement* ber, ber_len_t* len, char** last)
     }
     char* before = ber->ber_ptr;
     ber_skip_tag(ber, &content);
-    *last = ber->ber_ptr + content;
-    const ber_tag_t tag = ber_next_element(ber, len, *last);
+    char* end = ber->ber_ptr + content;
+    const ber_tag_t tag = ber_next_element(ber, len, end);
     if (tag == LBER_ERROR) {
         ber->ber_ptr = before;
+    } else {
+        *last = end;
     }
     return tag;
 }
 
 ber_tag_t fber_get_string_len(BerElement* ber, char** text, ber_len_t* len)
 {
-    if (text == nullptr || len == nullptr) {
-        return LBER_ERROR;
-    }
     berval value = {0, nullptr};
-    const ber_tag_t tag = ber_scanf(ber, "o", &value);
-    *text = value.bv_val;
-    *len = value.bv_len;
+    const ber_tag_t tag = text == nullptr || len == nullptr ? LBER_ERROR : ber_scanf(ber, "o", &value);
+    if (text != nullptr) {
+        *text = value.bv_val;
+    }
+    if (len != nullptr) {
+        *len = value.bv_len;
+    }
     return tag;
 }
 

@@ -1,6 +1,11 @@
 // What the sources of BER elements share.
 #pragma once
 
+#include <cerrno>
+#include <climits>
+#include <cstdlib>
+#include <cstring>
+
 #include "libraries/libber/ber_element.h"
 
 // The bits of ber_state.
@@ -36,6 +41,24 @@ inline bool ber_is_universal(ber_tag_t tag)
 inline bool ber_is_constructed(ber_tag_t tag)
 {
     return (tag & 0x20) != 0;
+}
+
+// A copy of a value's bytes with a zero byte behind them, for free(); null when memory ran out.
+inline char* ber_copy_bytes(const berval& value)
+{
+    const unsigned long length = value.bv_val == nullptr ? 0 : value.bv_len;
+    if (length == ULONG_MAX) {  // no room for the zero byte
+        errno = ENOMEM;
+        return nullptr;
+    }
+    auto* copy = static_cast<char*>(std::malloc(length + 1));
+    if (copy != nullptr) {
+        if (length != 0) {
+            std::memcpy(copy, value.bv_val, length);
+        }
+        copy[length] = '\0';
+    }
+    return copy;
 }
 
 // Reads the tag and the length of the value at *at, whose content has to end at or before `end`, and moves *at to the

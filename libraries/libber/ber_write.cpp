@@ -3,6 +3,8 @@
 // All goes into one block that grows by doubling. A construction is opened with room for the one length octet that most
 // need. When it is closed and needs more, its content moves by so much; a run of closings ("}}") moves every byte once,
 // to its last place.
+#include <algorithm>
+#include <cerrno>
 #include <cstdarg>
 #include <cstdlib>
 #include <cstring>
@@ -26,6 +28,7 @@ __attribute__((noinline)) bool grow(BerElement& ber, std::size_t more)
     const std::size_t length = used(ber);
     const std::size_t needed = length + more;
     if (needed > max_length) {
+        errno = ENOMEM;
         return false;
     }
     const auto before = static_cast<std::size_t>(ber.ber_end - ber.ber_buf);
@@ -83,7 +86,7 @@ ber_tag_t take_tag(BerElement& ber, ber_tag_t own)
 
 bool put_bytes(BerElement& ber, ber_tag_t tag, const char* bytes, std::size_t length)
 {
-    if (length > max_length || !has_room(ber, length + max_header)) {
+    if (!has_room(ber, std::min(length, max_length) + max_header)) {  // a value that is cut here has no room
         return false;
     }
     char* out = ber.ber_ptr;
@@ -144,7 +147,7 @@ bool open(BerElement& ber, ber_tag_t own)
 // Closes the innermost `count` constructions, which all end here.
 bool close(BerElement& ber, std::size_t count)
 {
-    if (count > ber.ber_open) {
+    if (count > ber.ber_open || ber.ber_tag != 0) {
         return false;
     }
     const std::size_t* innermost = ber.ber_starts + ber.ber_open - 1;

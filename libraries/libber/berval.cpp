@@ -1,9 +1,9 @@
 // Counted values: see berval.h.
 #include "libraries/libber/berval.h"
 
-#include <climits>
 #include <cstdlib>
-#include <cstring>
+
+#include "libraries/libber/ber_state.h"
 
 extern "C" {
 
@@ -12,22 +12,14 @@ berval* ber_bvdup(const berval* value)
     if (value == nullptr) {
         return nullptr;
     }
-    const unsigned long length = value->bv_val == nullptr ? 0 : value->bv_len;
-    if (length == ULONG_MAX) {  // no room for the zero byte
-        return nullptr;
-    }
     auto* copy = static_cast<berval*>(std::malloc(sizeof(berval)));
-    auto* bytes = static_cast<char*>(std::malloc(length + 1));
+    char* bytes = ber_copy_bytes(*value);
     if (copy == nullptr || bytes == nullptr) {
         std::free(copy);
         std::free(bytes);
         return nullptr;
     }
-    if (length != 0) {
-        std::memcpy(bytes, value->bv_val, length);
-    }
-    bytes[length] = '\0';
-    *copy = {length, bytes};
+    *copy = {value->bv_val == nullptr ? 0 : value->bv_len, bytes};
     return copy;
 }
 

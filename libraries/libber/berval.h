@@ -13,9 +13,9 @@ struct berval {
 
 DIRBASE_C_BEGIN
 
-// Returns a copy for the caller to release with ber_bvfree; null when `value` is null or memory ran out. The copy
-// always has bytes, followed by a zero byte that doesn't count; a value whose bv_val is null is copied as the empty
-// one.
+// Returns a copy for the caller to release with ber_bvfree; null when `value` is null or memory ran out (errno is
+// ENOMEM then). The copy always has bytes, followed by a zero byte that doesn't count; a value whose bv_val is null is
+// copied as the empty one.
 DIRBASE_EXPORT berval* ber_bvdup(const berval* value);
 
 // Release a value with its bytes, and a null-terminated array with its values. Null does nothing.

@@ -11,9 +11,9 @@
 
 typedef struct LDAPControl LDAPControl;
 struct LDAPControl {
-    char* ldctl_oid;
-    berval ldctl_value;  // bv_val is null when the control has no value
-    int32_t ldctl_iscritical;
+    char* ldctl_oid;           // null only in a record that is still to be filled
+    berval ldctl_value;        // bv_val is null when the control has no value
+    int32_t ldctl_iscritical;  // 0: not critical; any other value: critical
 };
 
 DIRBASE_C_BEGIN

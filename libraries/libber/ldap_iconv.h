@@ -27,11 +27,16 @@ DIRBASE_C_BEGIN
 DIRBASE_EXPORT ldap_iconv_t* ldap_iconv_open(const char* to, const char* from);
 
 // Converts as much as it can, and moves the positions and the counts of bytes left on behind what was read and written.
-// With a null `in`, or a null position in it, the conversion is set to the start of a text.
+// Where `in` and its position are given, the others must be, too.
 //
-// Returns the number of characters for which the target has only a substitute, 0 in general, or -1 with errno: EILSEQ
-// for input that is no text or that the target lacks, EINVAL for input that ends within a character, E2BIG for output
-// without room, EBADF without a conversion. All of these leave the positions at the place in question.
+// With a null `in`, or a null position in it, the conversion is set to the start of a text. Where `out`, its
+// position and `out_left` are given, what closes a text in a stateful target is written there first; with a null `out`,
+// or a null position in it, nothing is written.
+//
+// Returns the number of characters for which the target has only a substitute, 0 in general and INT_MAX where it is
+// more, or -1 with errno: EILSEQ for input that is no text or that the target lacks, EINVAL for input that ends within
+// a character, E2BIG for output without room, EBADF without a conversion. All of these leave the positions at the place
+// in question.
 DIRBASE_EXPORT int ldap_iconv(ldap_iconv_t* conversion, char** in, size_t* in_left, char** out, size_t* out_left);
 
 // Closes a conversion, or does nothing for null. Returns 0, or -1 with errno when the platform refuses; the record is

@@ -1,4 +1,4 @@
-// Result codes: those of the protocol (RFC 4511 section 4.1.9) and those of the client interface, from 80 up.
+// Result codes: those in use of the protocol (RFC 4511 section 4.1.9), and of the client interface, from 81 up.
 #pragma once
 
 #include "libraries/dirbase_export.h"

@@ -1,6 +1,7 @@
 // The configuration client's calls: see cfg.h.
 #include "libraries/libcfg/cfg.h"
 
+#include <cerrno>
 #include <cstddef>
 #include <cstdlib>
 #include <cstring>
@@ -183,6 +184,9 @@ text_guard clear_text(const cfg_handle& cfg, const cfg_value& value)
     char* clear = nullptr;
     unsigned long length = 0;
     if (unformat_password(value.text.data(), value.text.size(), &cfg.key, &clear, &length) == 0) {
+        if (errno == ENOMEM) {
+            throw std::bad_alloc();
+        }
         return nullptr;
     }
     if (std::strlen(clear) != length) {
@@ -295,20 +299,19 @@ int cfg_search_s(cfg_handle* cfg, const char* base, int scope, const char* filte
 
 cfg_message* cfg_first_entry(cfg_handle* cfg, cfg_message* result)
 {
-    run(cfg, [&] { return result == nullptr ? bad_argument : success; });
-    return result == nullptr || result->entry == nullptr ? nullptr : result;
+    const int code = run(cfg, [&] { return result == nullptr ? bad_argument : success; });
+    return code != LDAP_SUCCESS || result->entry == nullptr ? nullptr : result;
 }
 
 cfg_message* cfg_next_entry(cfg_handle* cfg, cfg_message* entry)
 {
-    run(cfg, [&] { return entry == nullptr ? bad_argument : success; });
-    return entry == nullptr ? nullptr : entry->next;
+    const int code = run(cfg, [&] { return entry == nullptr ? bad_argument : success; });
+    return code != LDAP_SUCCESS ? nullptr : entry->next;
 }
 
 int cfg_count_entries(cfg_handle* cfg, cfg_message* result)
 {
-    run(cfg, [&] { return result == nullptr ? bad_argument : success; });
-    if (result == nullptr) {
+    if (run(cfg, [&] { return result == nullptr ? bad_argument : success; }) != LDAP_SUCCESS) {
         return -1;
     }
     int count = 0;

@@ -12,10 +12,11 @@
 //     }
 //     cfg_unbind(cfg);
 //
-// The file is read once, by cfg_bind_s; what becomes of it afterwards isn't seen. Every call with a handle, but for
-// setting a flag, sets the handle's result code, which cfg_get_errno gives; calls that return a code return the same
-// one, and for the others a null result comes with LDAP_SUCCESS where there simply is nothing more. LDAP_PARAM_ERROR
-// stands for a missing handle or argument, LDAP_NO_MEMORY for memory that ran out.
+// The file is read once, by cfg_bind_s; what becomes of it afterwards isn't seen. A call with a handle sets the
+// handle's result code, which cfg_get_errno gives, but for cfg_get_errno, cfg_perror and cfg_dump_exception themselves
+// and for the setting of a flag. Calls that return a code return the same one, and for the others a null result comes
+// with LDAP_SUCCESS where there simply is nothing more. LDAP_PARAM_ERROR stands for a missing handle or argument, and
+// nothing is given or done then; LDAP_NO_MEMORY for memory that ran out.
 //
 // Threads: a handle and the messages of its searches belong to one thread at a time; different handles may be used at
 // once.
@@ -70,7 +71,7 @@ DIRBASE_EXPORT int cfg_set_option(cfg_handle* cfg, int option, const void* value
 //
 //   LDAP_SUCCESS
 //   LDAP_PARAM_ERROR                no file was set
-//   LDAP_LOCAL_ERROR                the file is missing, no regular file, longer than 64 MB, or can't be read
+//   LDAP_LOCAL_ERROR                the file is missing, no regular file, longer than 16 MB, or can't be read
 //   LDAP_DECODING_ERROR             a line that is none, or an entry that doesn't begin with its name
 //   LDAP_INVALID_DN_SYNTAX          a malformed name
 //   LDAP_ALREADY_EXISTS             a second entry of one name
@@ -81,15 +82,15 @@ DIRBASE_EXPORT int cfg_set_option(cfg_handle* cfg, int option, const void* value
 // After a failure the session is as it was before: unbound, or on what an earlier bind had read.
 DIRBASE_EXPORT int cfg_bind_s(cfg_handle* cfg, const char* name, const char* password, int method);
 
-// Ends a session; null does nothing. Results of its searches stay good. Returns LDAP_SUCCESS.
+// Ends a session; null does nothing. Results of its searches stay good: any other handle reads them, and decodes their
+// values by its own key. Returns LDAP_SUCCESS.
 DIRBASE_EXPORT int cfg_unbind(cfg_handle* cfg);
 
 // ---- searching ------------------------------------------------------------------------------------------------------
 
 // Looks for entries.
 //
-//   base        DN, compared without regard to ASCII case and to blanks beside separators; empty for the root, which is
-//               no entry itself
+//   base        DN, compared as README.md tells for names; empty for the root, which is no entry itself
 //   scope       cfg_scope
 //   filter      "attribute=value" or "attribute=*", in parentheses or not (RFC 4515 section 3, without its other
 //               forms). A value equals another without regard to ASCII case, and encoded ones as they stand in the
@@ -109,7 +110,7 @@ DIRBASE_EXPORT int cfg_search_s(cfg_handle* cfg, const char* base, int scope, co
 DIRBASE_EXPORT cfg_message* cfg_first_entry(cfg_handle* cfg, cfg_message* result);
 DIRBASE_EXPORT cfg_message* cfg_next_entry(cfg_handle* cfg, cfg_message* entry);
 
-// The number of entries from `result` on; -1 for a null one.
+// The number of entries from `result` on; -1 for a null argument.
 DIRBASE_EXPORT int cfg_count_entries(cfg_handle* cfg, cfg_message* result);
 
 // Releases a result with its entries; null does nothing. Returns LDAP_SUCCESS.
@@ -131,8 +132,8 @@ DIRBASE_EXPORT char* cfg_next_attribute(cfg_handle* cfg, cfg_message* entry, cfg
 // doesn't decode to a text.
 DIRBASE_EXPORT char** cfg_get_values(cfg_handle* cfg, cfg_message* entry, const char* attribute);
 
-// Release what the calls above gave. Values are overwritten first, for there may be passwords among them. Null does
-// nothing.
+// Release what the calls above gave. Values are overwritten first, for there may be passwords among them, and so are
+// the file's text and the values that a session keeps of it. Null does nothing.
 DIRBASE_EXPORT void cfg_value_free(char** values);
 DIRBASE_EXPORT void cfg_memfree(void* text);
 DIRBASE_EXPORT void cfg_ber_free(cfg_ber* cursor);

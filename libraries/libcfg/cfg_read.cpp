@@ -34,7 +34,7 @@ private:
     int number_;
 };
 
-cfg_failure read_all(const char* path, std::string& text)
+cfg_failure read_all(const char* path, wiped_text& text)
 {
     // Without waiting, or a pipe in the place of the file would hold the server up.
     const descriptor file(open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK));
@@ -48,7 +48,8 @@ cfg_failure read_all(const char* path, std::string& text)
     if (!S_ISREG(status.st_mode)) {
         return {LDAP_LOCAL_ERROR, "it is no regular file"};
     }
-    constexpr std::size_t longest = 64 * 1024 * 1024;
+    // A file of the shortest entries takes some twenty times its length in memory.
+    constexpr std::size_t longest = 16 * 1024 * 1024;
     constexpr std::size_t step = 65536;
     text.reserve(std::min(static_cast<std::size_t>(status.st_size), longest) + step);
     for (;;) {
@@ -198,7 +199,7 @@ public:
             return {LDAP_DECODING_ERROR, "a continuation of no line", number};
         }
         std::string_view name;
-        std::string value;
+        wiped_text value;
         if (const char* const fault = split(line, name, value); fault != nullptr) {
             return {LDAP_DECODING_ERROR, fault, number};
         }
@@ -237,11 +238,12 @@ private:
 
 cfg_failure read_cfg_file(const char* path, cfg_tree& tree)
 {
-    std::string text;
+    wiped_text text;
     cfg_failure failure = read_all(path, text);
     line_reader lines(text);
     tree_builder builder(tree);
-    std::string line;
+    wiped_text line;
+    line.reserve(text.size());  // continuations don't make it move
     while (failure.code == LDAP_SUCCESS && lines.next(line)) {
         failure = builder.take(line, lines.number());
     }

@@ -21,6 +21,13 @@ bool is_blank(char c)
     return c == ' ' || c == '\t';
 }
 
+// Compares a text with one in lower case, and makes no copy of what may be a password.
+bool equals(std::string_view text, std::string_view in_lower_case)
+{
+    return std::equal(text.begin(), text.end(), in_lower_case.begin(), in_lower_case.end(),
+                      [](char a, char b) { return lower(a) == b; });
+}
+
 int hex_digit(char c)
 {
     c = lower(c);
@@ -34,6 +41,9 @@ public:
     {
         for (std::size_t i = 0; i < dn.size(); ++i) {
             const char c = dn[i];
+            if ((c == '\\' || c == '"') && !in_value_) {
+                return false;
+            }
             if (c == '\\') {
                 if (++i == dn.size()) {
                     return false;
@@ -192,9 +202,8 @@ bool cfg_filter::matches(const cfg_entry& entry) const
         return true;
     }
     const cfg_attribute* const found = entry.find(attribute);
-    return found != nullptr &&
-           (presence || std::any_of(found->values.begin(), found->values.end(),
-                                    [this](const cfg_value& v) { return to_lower(v.text) == value; }));
+    return found != nullptr && (presence || std::any_of(found->values.begin(), found->values.end(),
+                                                        [this](const cfg_value& v) { return equals(v.text, value); }));
 }
 
 cfg_failure search_cfg_tree(const cfg_tree& tree, const std::string& base_key, int scope, const cfg_filter& filter,

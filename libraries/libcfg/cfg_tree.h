@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstring>
 #include <map>
 #include <string>
 #include <string_view>
@@ -20,8 +21,22 @@ struct cfg_failure {
     int system_error = 0;     // errno, or 0
 };
 
+// A text that may hold a password: its bytes are overwritten before they are released. Where it grows, what it leaves
+// behind isn't, so those that read a file make room first.
+class wiped_text : public std::string {
+public:
+    wiped_text() = default;
+    wiped_text(wiped_text&&) noexcept = default;
+    wiped_text& operator=(wiped_text&&) noexcept = default;
+    ~wiped_text()
+    {
+        resize(capacity());
+        explicit_bzero(data(), size());
+    }
+};
+
 struct cfg_value {
-    std::string text;  // without zero bytes
+    wiped_text text;  // without zero bytes
     std::size_t line;
 };
 
@@ -48,8 +63,9 @@ constexpr char cfg_rdn_end = '\0';
 // A to Z as a to z, all other bytes as they are.
 std::string to_lower(std::string_view text);
 
-// Makes the key of a DN: in lower case, and without blanks beside separators. False for a DN with an RDN that has no
-// type, an open quotation mark, or a backslash at its end. The empty DN has an empty key.
+// Makes the key of a DN: in lower case, and without blanks beside separators. A text of blanks, or of nothing, is the
+// root, whose key is empty. False for a DN with an RDN that has no type, a backslash or a quotation mark in a type, an
+// open quotation mark, a backslash at its end, or a zero byte.
 bool make_cfg_key(std::string_view dn, std::string& key);
 
 // A filter of one assertion.

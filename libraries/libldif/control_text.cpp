@@ -1,13 +1,17 @@
 // Controls to and from LDIF: see control_text.h.
 #include "libraries/libldif/control_text.h"
 
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <memory>
+#include <string_view>
 #include <utility>
 
 #include "libraries/libldif/line64.h"
@@ -138,6 +142,31 @@ bool unescape(char* text)
     return true;
 }
 
+// Whether an OID can stand in a line: one with a blank or a colon would read back as another control, and one with a
+// line end would add a line of its sender's choice.
+bool is_one_word(std::string_view oid)
+{
+    return std::all_of(oid.begin(), oid.end(), [](char c) { return c > ' ' && c < 0x7f && c != ':'; });
+}
+
+// A regular file, opened for reading. Anything else (a pipe would wait for a writer) is null with errno set.
+std::FILE* open_regular(const char* path)
+{
+    const int descriptor = open(path, O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+    if (descriptor < 0) {
+        return nullptr;
+    }
+    struct stat status = {};
+    std::FILE* file = nullptr;
+    if (fstat(descriptor, &status) == 0 && S_ISREG(status.st_mode)) {
+        file = fdopen(descriptor, "rb");
+    }
+    if (file == nullptr) {
+        close(descriptor);
+    }
+    return file;
+}
+
 std::int64_t refuse_file(const char* step, const char* path)
 {
     debug_error("localfromfile: %s error %s\n", step, path);
@@ -194,7 +223,7 @@ LDAPControl* string2control(const char* line, int* is_base64, int* is_url)
 
 char* control2string(const LDAPControl* control)
 {
-    if (control == nullptr || control->ldctl_oid == nullptr) {
+    if (control == nullptr || control->ldctl_oid == nullptr || !is_one_word(control->ldctl_oid)) {
         return nullptr;
     }
     const bool has_value = control->ldctl_value.bv_val != nullptr;
@@ -276,15 +305,11 @@ std::int64_t localfromfile(const char* path, berval* target)
     if (path == nullptr || target == nullptr) {
         return refuse_file("fopen", "(null)");
     }
-    const std::unique_ptr<std::FILE, close_file> file(std::fopen(path, "rb"));
+    const std::unique_ptr<std::FILE, close_file> file(open_regular(path));
     if (file == nullptr) {
         return refuse_file("fopen", path);
     }
-    // The end of a directory is wherever its file system likes.
-    struct stat status = {};
-    const bool has_end =
-        fstat(fileno(file.get()), &status) == 0 && !S_ISDIR(status.st_mode) && std::fseek(file.get(), 0, SEEK_END) == 0;
-    const long size = has_end ? std::ftell(file.get()) : -1;
+    const long size = std::fseek(file.get(), 0, SEEK_END) == 0 ? std::ftell(file.get()) : -1;
     if (size < 0 || std::fseek(file.get(), 0, SEEK_SET) != 0) {
         return refuse_file("fseek", path);
     }

@@ -19,30 +19,38 @@ DIRBASE_C_BEGIN
 // The word behind the OID tells the criticality, "true" or "false", on whichever side of the ":"; any other is the
 // value of a control that isn't critical, and ends at a space, ":" or line end. Behind a criticality a plain value is
 // all that follows the ":" up to the line end, spaces included; with a blank in front of the ":" that mark belongs to
-// it. A Base64 value that reads "true" or "false" is taken for the criticality.
+// it. So a plain value that control2string has written comes back with its space in front, while Base64 comes back as
+// it was. A Base64 value that reads "true" or "false" is taken for the criticality, and ":<" with nothing behind it for
+// no value. The text is that of one control alone: a missing word is looked for in the lines behind it.
+//
+// A URL makes the process read whatever regular file it names, of any length, with its own rights: not for texts of
+// clients.
 //
 // Returns a new control for the caller to release with ldap_control_free. Null, with a line in the debug log, for null
 // arguments, without an OID, for bad Base64, a file that can't be read, and without memory.
 DIRBASE_EXPORT LDAPControl* string2control(const char* line, int* is_base64, int* is_url);
 
 // The text of a control, new, for the caller to free(): with a value a line with its line feed, without one a line that
-// lacks it. Null for a null control, one without an OID, and without memory.
+// lacks it. Null for a null control; for one whose OID is missing or holds a blank, a colon, a control character or a
+// byte outside ASCII; and without memory.
 DIRBASE_EXPORT char* control2string(const LDAPControl* control);
 
 // Appends the controls that stand in a text, each from one "control" to the next.
 //
 //   array  null-terminated, of malloc; null for none. The old array isn't to be used afterwards.
-//   text   changed
+//   text   changed. The word is looked for everywhere, so a plain value that holds it ends there, unlike Base64.
 //
-// Returns the array, grown; stretches of the text that give no control are left out. A text without controls, and
-// memory running out for the array, leave it as it is.
+// Returns the array, grown, for the caller to release with ldap_controls_free. Stretches of the text that give no
+// control, or for which memory ran out, are left out; when all are, a null array becomes an empty one. A text without
+// the word, and memory running out for the array, leave it as it is.
 DIRBASE_EXPORT LDAPControl** string2controlarray(LDAPControl** array, char* text);
 
 // The texts of all controls, with a line feed between two of them (and behind a single one), new, for the caller to
-// free(). Null for a null or empty array, and without memory.
+// free(). The text of a control with a value ends its own line, so an empty line stands behind it. Null for a null or
+// empty array, when control2string has no text for one of them, and without memory.
 DIRBASE_EXPORT char* control2stringarray(LDAPControl** array);
 
-// Reads a file whole.
+// Reads a regular file whole.
 //
 //   target  takes the bytes, new, for the caller to free(); they aren't zero-terminated. After a failure it is as it
 //           was.

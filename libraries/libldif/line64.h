@@ -2,6 +2,8 @@
 //
 // A text is read in place. The line reader overwrites a fold (a line feed and the white space behind it) by two
 // markers, bytes of value 1, so the text keeps its length; the parser drops markers. A marker is never part of a value.
+// Lines end in a line feed alone. A carriage return in front of it belongs to the line, and a line of nothing but one
+// continues the line before it: whoever reads texts with CR LF takes the carriage returns out first.
 //
 // Lines are written into room of the caller's, or into new texts. The column limit is 76: a line whose next character
 // would stand in column 77 is broken by a line feed and a space, and that character counts as column 1 again. Types are
@@ -55,7 +57,8 @@ DIRBASE_EXPORT char* str_remove_continued_line_marker(char* text, int* removed);
 //   is_base64  unless null takes 1 for a line with "::", else 0
 //
 // Returns LDIF_LINE_OK; LDIF_LINE_EMPTY for a line without Base64 and without a value, with value the empty text; or
-// LDIF_LINE_BAD, with length 0 and value null (for bad Base64 there is a type). The line is changed in any case.
+// LDIF_LINE_BAD, also for a null line, with length 0 and value null (for bad Base64 there is a type). The line is
+// changed in any case. The second form does without is_base64.
 DIRBASE_EXPORT int str_parse_line_v_or_bv(char* line, char** type, char** value, size_t* length, int mode, int* is_url,
                                           int* is_base64);
 DIRBASE_EXPORT int str_parse_line(char* line, char** type, char** value, size_t* length, int mode, int* is_url);
@@ -66,8 +69,8 @@ DIRBASE_EXPORT int str_parse_line(char* line, char** type, char** value, size_t*
 //   length  takes the number of bytes, without that zero byte
 //
 // Returns 0; LDAP_DECODING_ERROR with length 0 when one of the first three characters of a group of four isn't of the
-// alphabet, or a group isn't whole (the fourth isn't tested: one outside the alphabet counts as "A"); -1 for a null
-// argument.
+// alphabet, or a group is cut by anything but "=" (the fourth isn't tested: one outside the alphabet counts as "A"; nor
+// is what stands behind the first "="); -1 for a null argument.
 DIRBASE_EXPORT int base64decode(char* target, const char* source, size_t* length);
 
 // ---- writing --------------------------------------------------------------------------------------------------------

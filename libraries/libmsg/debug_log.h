@@ -1,8 +1,8 @@
 // The debug log: free text for the developer, off until a level is set.
 //
 // The level is a mask of classes. PrintDebug writes a text when its class meets the mask; the helpers below stand in
-// front of it so that nothing is formatted while the log is off. Every function may be called from any thread and never
-// throws.
+// front of it so that nothing is formatted while the log is off. Every function may be called from any thread, never
+// throws and leaves errno alone.
 #pragma once
 
 #include <stdbool.h>
@@ -13,8 +13,9 @@
 DIRBASE_NUMBER(unsigned, LDAP_DEBUG_TRACE, 0x00000001u);    // what happens, step by step
 DIRBASE_CONSTANT(unsigned, LDAP_DEBUG_ERROR, 0xC8110000u);  // something failed
 
-// Takes debug texts in place of the built-in sinks. Called under the log's own lock; `text` is borrowed for the call
-// and is as the caller formatted it, line feed included.
+// Takes debug texts in place of the built-in sinks. Called on the thread that logs, one text at a time under the log's
+// own lock: it must not write debug texts or choose their sink, and must not throw, which ends the process. `text` is
+// borrowed for the call and is as the caller formatted it, line feed included.
 typedef void (*debug_sink)(void* context, unsigned level, const char* text);
 
 DIRBASE_C_BEGIN
@@ -26,11 +27,12 @@ DIRBASE_EXPORT void write_ldap_debug(unsigned level);
 // Writes a text of class `level` in the manner of printf; nothing happens when the class is not in the mask.
 DIRBASE_EXPORT void PrintDebug(unsigned level, const char* format, ...) __attribute__((format(printf, 2, 3)));
 
-// Chooses where debug texts go: a function, or with a null function back to standard error, the sink at start.
+// Chooses where debug texts go: a function, or with a null function back to standard error, the sink at start. An open
+// file is closed. When it returns the old function isn't called any more, and its context may go.
 DIRBASE_EXPORT void set_debug_sink(debug_sink sink, void* context);
 
 // Sends debug texts to the end of a file, made with permissions 0640 when it is missing. Returns 0, or the errno of the
-// failed open, after which the sink is as it was.
+// failed open (EINVAL for a null path), after which the sink is as it was.
 DIRBASE_EXPORT int set_debug_file(const char* path);
 
 DIRBASE_C_END

@@ -18,6 +18,8 @@
 #include <pthread.h>
 #include <unistd.h>
 
+#include "libraries/mutex_holder.h"
+
 // Gives errno back its value on the way out: a caller may log first and look at errno afterwards.
 class errno_keeper {
 public:
@@ -79,7 +81,7 @@ public:
     // place.
     void write(const built_text& line)
     {
-        const holder lock(mutex_);
+        const mutex_holder lock(mutex_);
         write_line(line);
     }
 
@@ -87,31 +89,28 @@ public:
     // after which the output points where it pointed. A null path is EINVAL.
     int set_file(const char* path)
     {
-        const int opened = open_file(path);
-        if (opened < 0)
-            return -opened;
-        const holder lock(mutex_);
-        point_to(opened);
-        return 0;
+        return set_file(path, [] {});
     }
 
     void set_standard_error()
     {
-        const holder lock(mutex_);
+        const mutex_holder lock(mutex_);
         point_to(STDERR_FILENO);
     }
 
 protected:
-    class holder {
-    public:
-        explicit holder(pthread_mutex_t& mutex) : mutex_(mutex) { pthread_mutex_lock(&mutex_); }
-        ~holder() { pthread_mutex_unlock(&mutex_); }
-        holder(const holder&) = delete;
-        holder& operator=(const holder&) = delete;
-
-    private:
-        pthread_mutex_t& mutex_;
-    };
+    // As set_file above; what `then` does happens under the same lock.
+    template <typename Then>
+    int set_file(const char* path, Then then)
+    {
+        const int opened = open_file(path);
+        if (opened < 0)
+            return -opened;
+        const mutex_holder lock(mutex_);
+        point_to(opened);
+        then();
+        return 0;
+    }
 
     // Returns the descriptor, or an errno negated.
     static int open_file(const char* path)
@@ -123,6 +122,13 @@ protected:
         do {
             opened = ::open(path, O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC | O_NOCTTY, 0640);
         } while (opened < 0 && errno == EINTR);
+        if (opened >= 0 && opened <= STDERR_FILENO) {  // one of the standard descriptors was closed: leave it so
+            const int moved = ::fcntl(opened, F_DUPFD_CLOEXEC, STDERR_FILENO + 1);
+            const int failure = errno;
+            ::close(opened);
+            errno = failure;
+            opened = moved;
+        }
         return opened < 0 ? -errno : opened;
     }
 
@@ -132,14 +138,26 @@ protected:
         if (descriptor_ != STDERR_FILENO)
             ::close(descriptor_);
         descriptor_ = descriptor;
+        cut_short_ = false;
     }
 
-    // A failure other than those of a busy descriptor loses the rest of the line: a log has nobody to complain to.
+    // A failure other than those of a busy descriptor loses the rest of the line: a log has nobody to complain to. The
+    // next line begins anew all the same.
     void write_line(const built_text& line)
     {
         const errno_keeper keep;
         line.data[line.length] = '\n';
-        std::string_view rest(line.data, line.length + 1);
+        if (cut_short_ && write_all("\n") == 0) {
+            cut_short_ = false;
+        }
+        const std::string_view whole(line.data, line.length + 1);
+        const std::size_t lost = write_all(whole);
+        cut_short_ = cut_short_ || (lost != 0 && lost != whole.size());
+    }
+
+    // Returns how many bytes could not be written.
+    std::size_t write_all(std::string_view rest)
+    {
         while (!rest.empty()) {
             const ssize_t written = ::write(descriptor_, rest.data(), rest.size());
             if (written >= 0) {
@@ -148,13 +166,15 @@ protected:
                 pollfd writable = {descriptor_, POLLOUT, 0};  // a pipe or terminal that somebody made non-blocking
                 ::poll(&writable, 1, -1);
             } else if (errno != EINTR) {
-                return;
+                break;
             }
         }
+        return rest.size();
     }
 
     pthread_mutex_t mutex_ = PTHREAD_MUTEX_INITIALIZER;
     int descriptor_ = STDERR_FILENO;
+    bool cut_short_ = false;  // the last line isn't whole
 };
 
 // A sink that a function may stand in for. Function is the type of a pointer whose first argument is the context.
@@ -166,7 +186,7 @@ public:
     // From here on lines go to the function; a null function means standard error. An open file is closed.
     void set_function(Function function, void* context)
     {
-        const holder lock(mutex_);
+        const mutex_holder lock(mutex_);
         point_to(STDERR_FILENO);
         function_ = function;
         context_ = context;
@@ -174,14 +194,10 @@ public:
 
     int set_file(const char* path)
     {
-        const int opened = open_file(path);
-        if (opened < 0)
-            return -opened;
-        const holder lock(mutex_);
-        point_to(opened);
-        function_ = nullptr;
-        context_ = nullptr;
-        return 0;
+        return log_output::set_file(path, [this] {
+            function_ = nullptr;
+            context_ = nullptr;
+        });
     }
 
     // Calls the function with the arguments, or writes the line when there is no function. A function that throws ends
@@ -189,7 +205,7 @@ public:
     template <typename... Arguments>
     void deliver(const built_text& line, const Arguments&... arguments) noexcept
     {
-        const holder lock(mutex_);
+        const mutex_holder lock(mutex_);
         if (function_ != nullptr)
             function_(context_, arguments...);
         else

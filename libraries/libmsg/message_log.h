@@ -6,7 +6,7 @@
 // sensible and never reads what isn't there. An id that the catalogue doesn't know still prints its component,
 // severity, id and arguments.
 //
-// Every function here may be called from any thread at any time and never throws.
+// Every function here may be called from any thread at any time, never throws and leaves errno alone.
 #pragma once
 
 #include <stddef.h>
@@ -64,8 +64,9 @@ struct message_record {
     const char* line;  // the whole line with time, severity and id, without a line feed
 };
 
-// Takes messages in place of the built-in sinks. Called under the log's own lock, one message at a time, so it must not
-// log itself; `context` is the pointer given with it. A reference and a pointer are passed alike.
+// Takes messages in place of the built-in sinks. Called on the thread that logs, one message at a time under the log's
+// own lock: it must not write messages or choose their sink, and must not throw, which ends the process. `context` is
+// the pointer given with it. A reference and a pointer are passed alike.
 #ifdef __cplusplus
 typedef void (*message_sink)(void* context, const message_record& record);
 #else
@@ -83,11 +84,12 @@ DIRBASE_EXPORT void PrintMessageArguments(int component, int severity, int id, c
 DIRBASE_EXPORT size_t getPrintedMessageArguments(char* buffer, size_t size, int component, int severity, int id,
                                                  const message_argument* arguments, size_t count);
 
-// Chooses where messages go: a function, or with a null function back to standard error, the sink at start.
+// Chooses where messages go: a function, or with a null function back to standard error, the sink at start. An open
+// file is closed. When it returns the old function isn't called any more, and its context may go.
 DIRBASE_EXPORT void set_message_sink(message_sink sink, void* context);
 
 // Sends messages to the end of a file, made with permissions 0640 when it is missing. Returns 0, or the errno of the
-// failed open, after which the sink is as it was.
+// failed open (EINVAL for a null path), after which the sink is as it was.
 DIRBASE_EXPORT int set_message_file(const char* path);
 
 DIRBASE_C_END

@@ -4,6 +4,7 @@
 #include "libraries/libpwd/pwd_format.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <cstddef>
 #include <cstdlib>
 #include <cstring>
@@ -21,6 +22,7 @@
 #include <strings.h>
 
 #include "libraries/libmsg/debug_log.h"
+#include "libraries/libpwd/crypt_cost.h"
 #include "libraries/libpwd/secret_block.h"
 
 namespace {
@@ -177,10 +179,11 @@ bool matches_hash(int method, std::string_view password, std::string_view text)
     if (!stored || (method == PWD_SSHA ? size < hash_size : size != hash_size)) {
         return false;
     }
-    unsigned char computed[EVP_MAX_MD_SIZE] = {};
-    return digest(method == PWD_MD5 ? EVP_md5() : EVP_sha1(), password, stored.view(size).substr(hash_size),
-                  computed) &&
-           CRYPTO_memcmp(computed, stored.data(), hash_size) == 0;
+    secret_block computed(EVP_MAX_MD_SIZE);
+    return computed &&
+           digest(method == PWD_MD5 ? EVP_md5() : EVP_sha1(), password, stored.view(size).substr(hash_size),
+                  computed.data()) &&
+           CRYPTO_memcmp(computed.data(), stored.data(), hash_size) == 0;
 }
 
 // What crypt makes of a value by a setting, which is a salt or a whole hash; no block when it refuses.
@@ -213,6 +216,11 @@ secret_block newly_crypted(std::string_view value)
 bool matches_crypt(std::string_view password, std::string_view text)
 {
     if (text.empty() || text.size() >= CRYPT_OUTPUT_SIZE || text.find('\0') != text.npos) {
+        return false;
+    }
+    if (!crypt_cost_is_bearable(text)) {
+        debug_error(
+            "Error - verify_password: a {crypt} value of unknown kind, or of more rounds or memory than is borne\n");
         return false;
     }
     char setting[CRYPT_OUTPUT_SIZE] = {};
@@ -386,6 +394,7 @@ int unformat_password(const char* value, unsigned long length, const aes_key_dat
 {
     *clear = nullptr;
     *clear_length = 0;
+    errno = 0;
     const std::string_view stored = view_of(value, length);
     const format& f = format_of(stored);
     if (!is_two_way(f.method) || !is_usable(key)) {
@@ -395,7 +404,10 @@ int unformat_password(const char* value, unsigned long length, const aes_key_dat
     std::size_t size = 0;
     secret_block text = decrypted(*key, f, stored, size);
     if (!text) {
-        debug_error("Error - unformat_password: value can't be decoded with this key\n");
+        const bool starved = errno == ENOMEM;  // set by the allocator, whoever called it
+        debug_error("Error - unformat_password: %s\n",
+                    starved ? "memory ran out" : "value can't be decoded with this key");
+        errno = starved ? ENOMEM : 0;
         return 0;
     }
     *clear = text.release();

@@ -4,7 +4,9 @@
 //     1   none      the value itself
 //     2   SHA       {SHA}     base64 of SHA-1 (value)
 //     3   MD5       {MD5}     base64 of MD5 (value)
-//     4   crypt     {crypt}   what crypt(3) makes of the value; new ones are SHA-512 crypt
+//     4   crypt     {crypt}   what crypt(3) makes of the value; new ones are SHA-512 crypt. A stored one that asks for
+//                             more than a server can spend on a comparison matches nothing: 1,000,000 rounds of SHA,
+//                             cost 14 of bcrypt, 64 MB of scrypt and yescrypt
 //     9   SSHA      {SSHA}    base64 of SHA-1 (value, salt) and the salt; new salts are 16 random bytes
 //     133 AES-256   {AES256}  base64 of a nonce of 12 random bytes, the AES-GCM cipher text (NIST SP 800-38D), and
 //     134 AES-192   {AES192}  a tag of 16 bytes over it and over the prefix as it stands
@@ -54,7 +56,8 @@ DIRBASE_C_BEGIN
 DIRBASE_EXPORT int check_format(const char* value, unsigned long length);
 
 // Length of the stored form of a value of `length` bytes, without a terminator; 0 for an unknown method, or a value too
-// long to be encoded (256 MB). Exact, as the methods above make all values of one length equally long.
+// long to be encoded (256 MB), and rightly for an empty value by method 1. Exact, as the methods above make all values
+// of one length equally long.
 DIRBASE_EXPORT unsigned long formatted_password_length(int method, unsigned long length);
 
 // Makes the stored form of a value. The value may hold any bytes (for crypt: no zero byte, and at most 511 bytes).
@@ -74,7 +77,9 @@ DIRBASE_EXPORT unsigned long format_password(int method, const char* salt, const
 //
 //   clear, clear_length  take a new text with a zero byte behind it, for the caller to free(); null and 0 on failure.
 //
-// Returns 1, or 0 when the value is not of a two-way method, was changed since it was made, or belongs to another key.
+// Returns 1, or 0: with errno at ENOMEM when memory ran out, as far as the crypto library lets that be seen, and at 0
+// when the value is not of a two-way method, was changed since it was made, belongs to another key, or the key is null
+// or of a wrong length. The caller wipes what he was given.
 DIRBASE_EXPORT int unformat_password(const char* value, unsigned long length, const aes_key_data* key, char** clear,
                                      unsigned long* clear_length);
 
@@ -97,8 +102,8 @@ DIRBASE_EXPORT int verify_password(const berval* password, const berval* stored,
 //   minOther     least number of other characters.
 //   minDiff      least number of characters that the old password doesn't hold; each place counts.
 //   maxRepeat    most places where one character may stand; 0 or below sets no limit.
-//   state        takes 0, or what to tell in a password policy response: 3 and the error number of that control, which
-//                is 9 (passwordTooShort) or 8 (insufficientPasswordQuality). May be null.
+//   state        takes 0, or what to tell in a password policy response, which is 3 more than the error number of that
+//                control: 9 for passwordTooShort (6), 8 for insufficientPasswordQuality (5). May be null.
 //
 // Returns LDAP_SUCCESS, LDAP_CONSTRAINT_VIOLATION for a password that breaks a rule, or with a state of 0
 // LDAP_PARAM_ERROR for a null password and LDAP_NO_MEMORY.

@@ -1,4 +1,7 @@
 // Trace runtime: which events are being traced, and where the trace goes.
+//
+// Every function may be called from any thread and leaves errno alone; ldtr_init reads the environment, which nobody
+// changes meanwhile.
 #pragma once
 
 #include <stdint.h>

@@ -1,5 +1,5 @@
 // Portable text helpers: what the C library offers under different names, or not at all, on the platforms of the
-// server.
+// server. Only vrn_strcasecmp takes null texts.
 #pragma once
 
 #include <stdarg.h>
@@ -16,7 +16,7 @@ DIRBASE_EXPORT int vrn_snprintf(char* buffer, size_t size, const char* format, .
 DIRBASE_EXPORT int vrn_vsnprintf(char* buffer, size_t size, const char* format, va_list arguments);
 
 // Formats into a new text of the right size, put in *text for the caller to free(). Returns its length, or -1 with
-// *text null when memory ran out.
+// *text null when memory ran out or the format can't be carried out.
 DIRBASE_EXPORT int vrn_asprintf(char** text, const char* format, ...) __attribute__((format(printf, 2, 3)));
 
 // Copies, or appends, as much of `from` as fits a buffer of `size` bytes and terminates it (size above 0). The result

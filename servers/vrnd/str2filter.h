@@ -1,9 +1,11 @@
 // Filters from text (RFC 4515), for configuration, replication filters, referral rules and plug-ins.
 //
 // Of that grammar extensible match is not offered: "cn:=a" is equality on a type "cn:". Elsewhere this reader asks for
-// less than the grammar does: a filter needs no parentheses around it, text behind its closing parenthesis is passed
-// over, a list may be empty and a NOT may have several elements (the first of which counts), white space may stand in
-// front of the elements of a list. There are no blanks around "=". The backslash with two hexadecimal digits stands for
+// less than the grammar does: a filter without elements needs no parentheses around it, text behind a closing
+// parenthesis is passed over, a list may be empty and a NOT may have several elements (the first of which counts),
+// white space may stand in front of the elements of a list. "&", "|" and "!" are read inside parentheses only: without
+// them, or with a blank in front of the first one, all up to the "=" is taken for a type. There are no blanks around
+// "=". The backslash with two hexadecimal digits stands for
 // a byte in values that are compared whole; in the pieces of a substring filter it stands for itself.
 //
 //   normalize  not 0: types and values are normalised by the schema, and there is no filter for an attribute that it
@@ -44,8 +46,9 @@ DIRBASE_EXPORT Filter* str2simple(const char* text, int normalize);
 // Returns LDAP_SUCCESS, or LDAP_NO_MEMORY with what was made before in the filter.
 DIRBASE_EXPORT int str2subvals(const char* text, Filter* filter, uint32_t syntax, int normalize);
 
-// The parenthesis that closes the one which the text begins with, or null; of a text that doesn't begin with one its
-// first character. A backslash hides the character behind it.
+// The parenthesis that closes the one which the text begins with, or null. A text that begins with neither parenthesis
+// gives its first character; for one that begins with a closing parenthesis the answer has no use. A backslash hides
+// the character behind it.
 DIRBASE_EXPORT const char* find_matching_paren(const char* text);
 
 // Replaces a backslash and two hexadecimal digits by their byte, and a backslash and one by a byte of its value; any

@@ -2,7 +2,7 @@
 // it.
 //
 //     expect_outcomes({
-//         {"dn_upcase", [] { ... }, "0 CN=A", {"90 cn=a"}},
+//         row("dn_upcase", "0 CN=A", {"90 cn=a"}, [] { ... }),
 //     });
 #pragma once
 
@@ -17,6 +17,7 @@
 #include <string>
 #include <string_view>
 #include <type_traits>
+#include <utility>
 #include <vector>
 
 #include "libraries/libmsg/debug_log.h"
@@ -54,33 +55,54 @@ struct outcome_row {
     const char* name;  // of the function
     // Sets up (calm), calls, releases, and tells the result together with what became of the caller's data.
     std::function<calm_text()> call;
-    std::string whole;                // what is told while no allocation fails
-    std::vector<std::string> failed;  // what is told when one has failed: each of these by some run, and nothing else
+    std::string whole = "made";  // what is told while no allocation fails
+    // What is told when one has failed: each of these by some run, and nothing else.
+    std::vector<std::string> failed = {"(null)"};
 };
+
+inline outcome_row row(const char* name, std::function<calm_text()> call)
+{
+    return {name, std::move(call)};
+}
+inline outcome_row row(const char* name, std::string whole, std::function<calm_text()> call)
+{
+    return {name, std::move(call), std::move(whole)};
+}
+inline outcome_row row(const char* name, std::string whole, std::vector<std::string> failed,
+                       std::function<calm_text()> call)
+{
+    return {name, std::move(call), std::move(whole), std::move(failed)};
+}
 
 inline void expect_outcomes(const std::vector<outcome_row>& rows)
 {
-    for (const outcome_row& row : rows) {
-        SCOPED_TRACE(row.name);
-        std::vector<bool> told(row.failed.size());
+    for (const outcome_row& each : rows) {
+        SCOPED_TRACE(each.name);
+        std::vector<bool> told(each.failed.size());
         const auto body = [&](std::size_t point) {
-            const calm_text result = row.call();
+            const calm_text result = [&] {
+                try {
+                    return each.call();
+                } catch (...) {
+                    return calm_text("raised");
+                }
+            }();
             const alloc_fault_pause pause;
             if (!allocation_failed()) {
-                EXPECT_EQ(result.str(), row.whole);
+                EXPECT_EQ(result.str(), each.whole);
                 return;
             }
-            const auto found = std::find(row.failed.begin(), row.failed.end(), result.str());
-            if (found == row.failed.end()) {
+            const auto found = std::find(each.failed.begin(), each.failed.end(), result.str());
+            if (found == each.failed.end()) {
                 ADD_FAILURE() << result.str() << ", allocation " << point;
             } else {
-                told[static_cast<std::size_t>(found - row.failed.begin())] = true;
+                told[static_cast<std::size_t>(found - each.failed.begin())] = true;
             }
         };
         for_each_failing_allocation(body, alloc_failures::one);
         for_each_failing_allocation(body, alloc_failures::all_from_there);
         for (std::size_t i = 0; i < told.size(); ++i) {
-            EXPECT_TRUE(told[i]) << "never told: " << row.failed[i];
+            EXPECT_TRUE(told[i]) << "never told: " << each.failed[i];
         }
     }
 }
@@ -117,15 +139,26 @@ calm_text tell(const Parts&... parts)
     return calm_text(out.str());
 }
 
-// Has the logs write their lines, and nobody keep them, for as long as one lives.
+// Has the logs write their lines for as long as one lives, and keeps what they got without a row's memory.
 class quiet_logs {
 public:
     quiet_logs()
     {
-        set_message_sink([](void*, const message_record&) {}, nullptr);
-        set_debug_sink([](void*, unsigned, const char*) {}, nullptr);
+        set_message_sink(
+            [](void* logs, const message_record& message) {
+                const alloc_fault_pause pause;
+                static_cast<quiet_logs*>(logs)->got_ += "message " + std::to_string(message.id) + "\n";
+            },
+            this);
+        set_debug_sink(
+            [](void* logs, unsigned, const char* text) {
+                const alloc_fault_pause pause;
+                static_cast<quiet_logs*>(logs)->got_ += text;
+            },
+            this);
         write_ldap_debug(LDAP_DEBUG_ERROR);
         message_no_memory();  // the C library reads the time zone once
+        take();
     }
     ~quiet_logs()
     {
@@ -135,6 +168,18 @@ public:
     }
     quiet_logs(const quiet_logs&) = delete;
     quiet_logs& operator=(const quiet_logs&) = delete;
+
+    // What came since the last call: debug texts as they are, messages by their numbers.
+    calm_text take()
+    {
+        const alloc_fault_pause pause;
+        calm_text text(got_);
+        got_.clear();
+        return text;
+    }
+
+private:
+    std::string got_ = std::string(1000, ' ');  // a block from the start on, or its making would look like a leak
 };
 
 // A copy on the C heap, made calmly.

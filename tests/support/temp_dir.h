@@ -13,6 +13,16 @@
 
 namespace test_support {
 
+// The whole content of a file.
+inline std::string file_text(const std::filesystem::path& file)
+{
+    std::ifstream in(file, std::ios::binary);
+    if (!in) {
+        throw std::runtime_error("can't read " + file.string());
+    }
+    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
+}
+
 // Every failure is raised as an exception, which fails the test that asked. Not to be shared between threads; two
 // objects never share a folder, in one process or in several.
 class temp_dir {
@@ -54,14 +64,7 @@ public:
     }
 
     // The whole content of the file `name`.
-    std::string read(std::string_view name) const
-    {
-        std::ifstream in(path_ / name, std::ios::binary);
-        if (!in) {
-            throw std::runtime_error("can't read " + path(name));
-        }
-        return std::string(std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>());
-    }
+    std::string read(std::string_view name) const { return file_text(path_ / name); }
 
 private:
     std::filesystem::path path_;

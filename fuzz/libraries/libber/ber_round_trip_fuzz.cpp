@@ -28,8 +28,9 @@ public:
     std::string bytes(std::size_t count)
     {
         std::string taken;
-        while (taken.size() < count && !is_empty())
+        while (taken.size() < count && !is_empty()) {
             taken += static_cast<char>(byte());
+        }
         taken.resize(count, 'x');
         return taken;
     }
@@ -52,8 +53,9 @@ void write(BerElement* ber, input from)
         case 0: result = ber_printf(ber, "b", static_cast<int>(small)); break;
         case 1: {
             std::uint64_t number = 0;
-            for (unsigned i = 0; i < small % 9; ++i)
+            for (unsigned i = 0; i < small % 9; ++i) {
                 number = number << 8 | from.byte();
+            }
             result = ber_printf(ber, "I", static_cast<std::int64_t>(number));
             break;
         }
@@ -68,8 +70,9 @@ void write(BerElement* ber, input from)
         case 6:
             result = ber_printf(ber, (step & 7) == 5 ? "t{" : "t[", 0xA0u + small % 31);
             expect((result == 0) == (open < LBER_MAX_OPEN), "so many may be open");
-            if (result != 0)
+            if (result != 0) {
                 return;
+            }
             ++open;
             break;
         default: {
@@ -128,8 +131,9 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     const element first(ber_alloc_t(1)), second(ber_alloc());
     write(first.get(), input(data, size));
     berval* flat = nullptr;
-    if (ber_flatten(first.get(), &flat) != 0)
+    if (ber_flatten(first.get(), &flat) != 0) {
         return 0;  // too much was open
+    }
     BerElement reading;
     expect(ber_init2(flat, 0, &reading) == 0, "it can be read");
     copy(&reading, second.get());

@@ -78,11 +78,12 @@ std::size_t walk(BerElement* ber)
     for (ber_tag_t tag = ber_peek_tag(ber, &len); tag != LBER_ERROR; tag = ber_peek_tag(ber, &len)) {
         expect(len < static_cast<ber_len_t>(ber->ber_end - ber->ber_ptr), "the content is all there");
         char* last = nullptr;
-        if ((tag & 0x20) != 0 && ber_first_element(ber, &len, &last) != LBER_ERROR)
+        if ((tag & 0x20) != 0 && ber_first_element(ber, &len, &last) != LBER_ERROR) {
             expect(last <= ber->ber_end, "a construction ends within the whole");
-        else
+        } else {
             expect((tag & 0x20) != 0 ? ber_skip_tag(ber, &len) == tag : ber_scanf(ber, "x") == tag,
                    "a value is passed");
+        }
         expect(ber->ber_ptr > before, "every step goes on");
         before = ber->ber_ptr;
         ++count;
@@ -94,8 +95,9 @@ std::size_t walk(BerElement* ber)
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size)
 {
-    if (size == 0)
+    if (size == 0) {
         return 0;
+    }
     const std::unique_ptr<char[]> block(new char[size - 1]);
     std::memcpy(block.get(), data + 1, size - 1);
     const berval value = {size - 1, block.get()};

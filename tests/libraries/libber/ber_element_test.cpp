@@ -98,10 +98,13 @@ TEST(BerPrintf, EveryLetterGivesTheShortestEncoding)
 TEST(BerPrintf, IntegersAreShortestAndComeBack)
 {
     std::vector<std::int64_t> numbers = {0, std::numeric_limits<std::int64_t>::min()};
-    for (int bit = 0; bit < 63; ++bit)
-        for (const std::int64_t near : {-1, 0, 1})
-            for (const std::int64_t sign : {-1, 1})
+    for (int bit = 0; bit < 63; ++bit) {
+        for (const std::int64_t near : {-1, 0, 1}) {
+            for (const std::int64_t sign : {-1, 1}) {
                 numbers.push_back(sign * ((std::int64_t{1} << bit) + near));
+            }
+        }
+    }
     for (const std::int64_t number : numbers) {
         const element ber(ber_alloc());
         ASSERT_EQ(ber_printf(ber.get(), "I", number), 0);
@@ -126,8 +129,9 @@ void print(BerElement* ber, const node& tree, std::string& closings, std::mt1993
         return;
     }
     ASSERT_EQ(ber_printf(ber, "t{", tree.tag), 0);
-    for (const node& member : tree.members)
+    for (const node& member : tree.members) {
         print(ber, member, closings, random);
+    }
     closings += '}';
     if (random() % 2 == 0) {
         ASSERT_EQ(ber_printf(ber, closings.c_str()), 0);
@@ -149,8 +153,9 @@ node scan(BerElement* ber)
     }
     char* last = nullptr;
     ber_tag_t tag = ber_first_element(ber, &len, &last);
-    for (; tag != LBER_DEFAULT && tag != LBER_ERROR; tag = ber_next_element(ber, &len, last))
+    for (; tag != LBER_DEFAULT && tag != LBER_ERROR; tag = ber_next_element(ber, &len, last)) {
         read.members.push_back(scan(ber));
+    }
     EXPECT_EQ(tag, LBER_DEFAULT);
     return read;
 }
@@ -190,15 +195,22 @@ TEST(BerPrintf, AFailureLastsAndTheElementIsReleased)
         EXPECT_EQ(ber_flatten(ber.get(), &flat), -1);
         EXPECT_EQ(flat, nullptr);
     }
+    for (const char* const format : {"{t}", "[{}t]i"}) {
+        EXPECT_EQ(ber_printf(element(ber_alloc()).get(), format, 0x80u, 1), -1) << "the tag of nothing: " << format;
+    }
     element ber(ber_alloc());
     EXPECT_EQ(ber_printf(ber.get(), full.c_str()), 0);
     berval* flat = nullptr;
     EXPECT_EQ(ber_flatten(ber.get(), &flat), -1);  // still open
     EXPECT_EQ(ber_printf(ber.get(), closed.c_str()), 0);
     std::string nested;
-    for (unsigned i = 0; i < LBER_MAX_OPEN; ++i)
+    for (unsigned i = 0; i < LBER_MAX_OPEN; ++i) {
         nested = seq(nested);
+    }
     EXPECT_EQ(written(*ber), nested);
+    EXPECT_TRUE(ber_printf(ber.get(), "t", 0x80u) == 0 && ber_flatten(ber.get(), &flat) == -1 && flat == nullptr);
+    EXPECT_TRUE(ber_printf(ber.get(), "i", 1) == 0 && ber_flatten(ber.get(), &flat) == 0);
+    ber_bvfree(flat);
 
     char* taken = ber->ber_buf;  // the block outlives the element
     ber_free(ber.release(), 0);
@@ -338,6 +350,7 @@ TEST(BerRead, HostileHeadersAndContentsAreRefused)
         {"\x02\1a"s, "m", false},  // a universal tag of something else
         {"\x04\1a"s, "I", false},
         {"\x0A\1a"s, "I", true},
+        {"\x02\x08\0\0\0\0\0\0\0\1"s, "I", true},  // in more bytes than need be
         {"\x02\1\1"s, "b", false},
         {"\x85\0"s, "I", false},  // contents that are none
         {"\x02\x09" + std::string(9, '\0'), "I", false},
@@ -363,7 +376,7 @@ TEST(BerRead, HostileHeadersAndContentsAreRefused)
     ber_len_t len = 0;
     char* last = nullptr;
     EXPECT_EQ(ber_first_element(overlong, &len, &last), LBER_ERROR);
-    EXPECT_EQ(overlong->ber_ptr, overlong->ber_buf);
+    EXPECT_TRUE(overlong->ber_ptr == overlong->ber_buf && len == 0 && last == nullptr);
     EXPECT_EQ(ber_scanf(reading(seq("\x04\5a"s) + "bcdefg"), "{x", nullptr), LBER_ERROR);
     EXPECT_EQ(ber_first_element(reading(text("abc")), &len, &last), LBER_ERROR);
     EXPECT_EQ(ber_first_element(reading(set("")), &len, &last), LBER_DEFAULT);
@@ -375,16 +388,18 @@ TEST(BerRead, NestingOfAnyDepthIsWalkedWithoutRecursion)
     constexpr std::size_t depth = 100'000;
     std::string reversed;  // the innermost first, each header back to front
     while (reversed.size() < 5 * depth) {
-        for (std::size_t i = 0, size = reversed.size(); i < 3; ++i, size >>= 8)
+        for (std::size_t i = 0, size = reversed.size(); i < 3; ++i, size >>= 8) {
             reversed += static_cast<char>(size);
+        }
         reversed += "\x83\xA2";
     }
     reading nested(std::string(reversed.rbegin(), reversed.rend()));
     ber_len_t len = 0;
     char* last = nullptr;
     std::size_t walked = 1;
-    while (ber_first_element(nested, &len, &last) == 0xA2)
+    while (ber_first_element(nested, &len, &last) == 0xA2) {
         ++walked;
+    }
     EXPECT_EQ(walked, depth);
     EXPECT_EQ(nested.left(), 0);
 }
@@ -408,6 +423,10 @@ TEST(BerElement, EachKindRefusesTheCallsOfTheOther)
     EXPECT_NE(copy->ber_buf, bytes.data());
     EXPECT_EQ(ber_peek_tag(copy.get(), &len), LBER_OCTETSTRING);
     EXPECT_EQ(len, 3u);
+    out = cn;
+    EXPECT_EQ(fber_get_string_len(copy.get(), nullptr, &len), LBER_ERROR);
+    EXPECT_EQ(fber_get_string_len(copy.get(), &out, nullptr), LBER_ERROR);
+    EXPECT_TRUE(len == 0 && out == nullptr && copy->ber_ptr == copy->ber_buf);
     EXPECT_EQ(ber_printf(copy.get(), "n"), -1);
     EXPECT_EQ(ber_printf(writer.get(), "n"), 0);
     EXPECT_EQ(ber_skip_tag(writer.get(), &len), LBER_ERROR);

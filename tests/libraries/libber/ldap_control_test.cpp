@@ -17,8 +17,9 @@ LDAPControl* make(const char* oid, const char* value, int critical = 0)
 {
     auto* control = static_cast<LDAPControl*>(std::calloc(1, sizeof(LDAPControl)));
     control->ldctl_oid = strdup(oid);
-    if (value != nullptr)
+    if (value != nullptr) {
         control->ldctl_value = {std::strlen(value), strdup(value)};
+    }
     control->ldctl_iscritical = critical;
     return control;
 }
@@ -38,8 +39,9 @@ TEST(LdapControl, ArraysGrowShrinkAndAreCopiedWhole)
 {
     LDAPControl** controls = nullptr;
     LDAPControl* of[] = {make("1.1", "abc"), make("1.2", nullptr, 1), make("1.3", "")};
-    for (LDAPControl* control : of)
+    for (LDAPControl* control : of) {
         EXPECT_EQ(ldap_insert_control(control, &controls), LDAP_SUCCESS);
+    }
     EXPECT_EQ(shown(controls), "1.1=abc;1.2!;1.3=;");
 
     LDAPControl** copy = nullptr;
@@ -82,8 +84,9 @@ TEST(LdapControl, WhatIsMissingIsToldOrDoesNothing)
 TEST(LdapErr2String, EachCodeHasATextOfItsOwnAndOthersShareOne)
 {
     std::set<std::string> texts;
-    for (int code = -300; code <= 300; ++code)
+    for (int code = -300; code <= 300; ++code) {
         texts.insert(ldap_err2string(code));
+    }
     EXPECT_EQ(texts.size(), 52u + 1);  // the enumerators of ldap_result, and the others
     EXPECT_STREQ(ldap_err2string(LDAP_SUCCESS), "Success");
     EXPECT_STREQ(ldap_err2string(-1), ldap_err2string(9));

@@ -1,6 +1,7 @@
 // Environment look-up: what it finds, and whose the answer is.
 #include <gtest/gtest.h>
 
+#include <cerrno>
 #include <cstdlib>
 #include <memory>
 
@@ -24,9 +25,11 @@ TEST(LdapGetenv, TellsUnsetFromEmptyAndGivesACopy)
     setenv("DIRBASE_TEST_VALUE", "no", 1);
     EXPECT_STREQ(value.get(), "YES");
     EXPECT_STREQ(empty.get(), "");
+    errno = ENOMEM + 1;
     EXPECT_EQ(ldap_getenv("DIRBASE_TEST_UNSET"), nullptr);
     EXPECT_EQ(ldap_getenv("DIRBASE_TEST_VALUE=YES"), nullptr);
     EXPECT_EQ(ldap_getenv(nullptr), nullptr);
+    EXPECT_EQ(errno, ENOMEM + 1);
 }
 
 }  // namespace

@@ -11,12 +11,14 @@ namespace slow_ber {
 inline std::string tlv(unsigned tag, const std::string& content)
 {
     std::string octets;
-    for (std::size_t rest = content.size(); rest != 0; rest /= 256)
+    for (std::size_t rest = content.size(); rest != 0; rest /= 256) {
         octets.insert(octets.begin(), static_cast<char>(rest % 256));
-    if (content.size() < 128)
+    }
+    if (content.size() < 128) {
         octets = std::string(1, static_cast<char>(content.size()));
-    else
+    } else {
         octets.insert(octets.begin(), static_cast<char>(128 + octets.size()));
+    }
     return static_cast<char>(tag) + octets + content;
 }
 
@@ -24,10 +26,12 @@ inline std::string tlv(unsigned tag, const std::string& content)
 inline std::string integer(unsigned tag, std::int64_t number)
 {
     std::string octets;
-    for (int shift = 56; shift >= 0; shift -= 8)
+    for (int shift = 56; shift >= 0; shift -= 8) {
         octets += static_cast<char>(number >> shift);
-    while (octets.size() > 1 && ((octets[0] == 0 && octets[1] >= 0) || (octets[0] == -1 && octets[1] < 0)))
+    }
+    while (octets.size() > 1 && ((octets[0] == 0 && octets[1] >= 0) || (octets[0] == -1 && octets[1] < 0))) {
         octets.erase(0, 1);
+    }
     return tlv(tag, octets);
 }
 
@@ -56,8 +60,9 @@ struct node {
     std::string encoded() const
     {
         std::string content = bytes;
-        for (const node& member : members)
+        for (const node& member : members) {
             content += member.encoded();
+        }
         return tlv(tag, content);
     }
 };
@@ -68,8 +73,9 @@ inline node random_tree(std::mt19937& random, unsigned depth)
     const auto below = [&](unsigned limit) { return static_cast<unsigned>(random() % limit); };
     if (depth != 0 && below(3) != 0) {
         node made{below(2) == 0 ? 0x30 : 0xA0 + below(31), ""};
-        for (unsigned count = below(6); count != 0; --count)
+        for (unsigned count = below(6); count != 0; --count) {
             made.members.push_back(random_tree(random, depth - 1));
+        }
         return made;
     }
     static constexpr unsigned sizes[] = {0, 1, 20, 100, 120, 130, 250, 260, 65'530};

@@ -3,10 +3,17 @@
 
 #include <gtest/gtest.h>
 
+#include <fcntl.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
+#include <array>
+#include <cstdint>
+#include <filesystem>
+#include <fstream>
 #include <memory>
 #include <string>
+#include <string_view>
 #include <tuple>
 #include <vector>
 
@@ -125,6 +132,8 @@ TEST(CfgFile, WhatIsRefusedIsNamedByReasonLineAndFile)
         {"dn: cn=\"a", 34, 1, "a malformed dn"},
         {"dn: cn=a\\", 34, 1, "a malformed dn"},
         {"dn: =a", 34, 1, "a malformed dn"},
+        {"dn: c\\n=a", 34, 1, "a malformed dn"},
+        {"dn: cn=a,\"cn\"=b", 34, 1, "a malformed dn"},
         {"dn: cn=a\n\n\ndn: CN = A\n", 68, 4, "a second entry of that dn"},
     };
     for (const auto& [text, code, line, reason] : table) {
@@ -157,6 +166,11 @@ TEST(CfgFile, AnUnreadableFileAndWhatNoFileHasAreRefused)
         cfg_dump_exception(cfg.get());
         EXPECT_TRUE(log.count() == 1 && log.texts()[0].ends_with(", file " + path + ", rc=82\n")) << log.texts()[0];
     }
+    for (const auto& [size, code] : {std::pair(16 << 20, 84), {(16 << 20) + 1, 82}}) {  // zeros, and too many
+        const std::string path = folder.write("long", "");
+        std::filesystem::resize_file(path, static_cast<std::uintmax_t>(size));
+        EXPECT_EQ(bind_to(open_file(path)), code);
+    }
     EXPECT_TRUE(cfg_init("localhost", 0) == nullptr && cfg_init(nullptr, 389) == nullptr);
     const handle cfg(cfg_init("", 0), cfg_unbind);
     EXPECT_TRUE(bind_to(cfg) == 89 && cfg_set_option(cfg.get(), CFG_OPT_FILE, "") == 89);
@@ -185,6 +199,9 @@ TEST(CfgSearch, ScopesAndFiltersChooseTheEntries)
         {"", CFG_SCOPE_ONE, "objectclass=*", "cn=\"y,o=b\" cn=z\\,o=b o=b "},
         {"", CFG_SCOPE_BASE, "objectclass=*", "32"},
         {"cn=v,o=b", CFG_SCOPE_SUB, "objectclass=*", "32"},
+        {"cn=\"x\",o=b", CFG_SCOPE_SUB, "objectclass=*", "32"},  // other names than cn=x
+        {"cn=\\78,o=b", CFG_SCOPE_SUB, "objectclass=*", "32"},
+        {"sn=y+cn=x,o=b", CFG_SCOPE_SUB, "objectclass=*", "32"},
         {"", CFG_SCOPE_SUB, "Sn=*", "cn=\"y,o=b\" cn=u, cn=v , o=B cn=x,o=b "},
         {"", CFG_SCOPE_SUB, "(sn=ONE\\2a)", "cn=u, cn=v , o=B cn=x,o=b "},
         {"", CFG_SCOPE_SUB, "(sn=one)", ""},
@@ -223,11 +240,57 @@ TEST(CfgValues, AKeyDecodesWhatItEncodedAndAResultOutlivesItsSession)
     ASSERT_EQ(cfg_search_s(cfg.get(), "cn=b", 0, "cn=*", nullptr, 0, &result), 0);
     EXPECT_TRUE(cfg_get_values(cfg.get(), result, "PW") == nullptr && cfg_get_errno(cfg.get()) == 84);
     EXPECT_TRUE(cfg_get_values(cfg.get(), result, "sn") == nullptr && cfg_get_errno(cfg.get()) == 16);
+    EXPECT_TRUE(cfg_first_entry(nullptr, result) == nullptr && cfg_count_entries(nullptr, result) == -1);
     EXPECT_EQ(cfg_set_option(cfg.get(), CFG_OPT_FILE, folder.write("other", "x").c_str()), 0);
     EXPECT_EQ(bind_to(cfg), 84);
     cfg = handle(cfg_init(nullptr, 0), cfg_unbind);
     EXPECT_EQ(text_of(cfg.get(), result), "cn=b{pw={aes256}damaged;cn=b;}");
     cfg_msgfree(result);
 }
+
+#if !defined(__SANITIZE_ADDRESS__) && !defined(__SANITIZE_THREAD__)  // the heap isn't where it is looked for
+
+// The program's heap, as far as it has come to it.
+std::string_view heap()
+{
+    std::ifstream maps("/proc/self/maps");
+    for (std::string line; std::getline(maps, line);) {
+        std::size_t at = 0;
+        if (line.ends_with("[heap]")) {
+            const std::size_t start = std::stoul(line, &at, 16);
+            return {reinterpret_cast<const char*>(start), std::stoul(line.substr(at + 1), nullptr, 16) - start};
+        }
+    }
+    return {};
+}
+
+TEST(CfgValues, NothingIsLeftOfThemInMemory)
+{
+    const temp_dir folder;
+    std::array<char, 64> line = {};  // on the stack, and of a word that stands in no other place
+    for (std::size_t i = 0; i < line.size(); ++i) {
+        line[i] = i < 16 ? "dn: cn=a\ncn: yz\n"[i] : i < 20 ? "pw: "[i - 16] : static_cast<char>('A' + i * 7 % 26);
+    }
+    const std::string_view password(line.data() + 20, line.size() - 20);
+    const int file = open(folder.path("conf").c_str(), O_WRONLY | O_CREAT, 0600);
+    ASSERT_EQ(write(file, line.data(), line.size()), static_cast<ssize_t>(line.size()));
+    close(file);
+    {
+        const handle cfg = open_file(folder.path("conf"));
+        ASSERT_EQ(bind_to(cfg), 0);
+        cfg_message* result = nullptr;
+        ASSERT_EQ(cfg_search_s(cfg.get(), "", CFG_SCOPE_SUB, "pw=x", nullptr, 0, &result), 0);
+        cfg_msgfree(result);
+        ASSERT_EQ(cfg_search_s(cfg.get(), "", CFG_SCOPE_SUB, "pw=*", nullptr, 0, &result), 0);
+        char** const values = cfg_get_values(cfg.get(), result, "pw");
+        EXPECT_EQ(*values, password);
+        EXPECT_NE(heap().find(password.substr(16, 20)), std::string_view::npos) << "the test looks in the wrong place";
+        cfg_value_free(values);
+        cfg_msgfree(result);
+    }
+    EXPECT_EQ(heap().find(password.substr(16, 20)), std::string_view::npos);
+}
+
+#endif
 
 }  // namespace

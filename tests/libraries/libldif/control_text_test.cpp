@@ -2,6 +2,7 @@
 #include "libraries/libldif/control_text.h"
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include <cstdlib>
 #include <fstream>
@@ -85,6 +86,11 @@ TEST(ControlText, ArraysAreWrittenAndReadBack)
     EXPECT_EQ(one, "control: 1.5 false\n");
     EXPECT_EQ(text_of(array + 4), "(null)");
     EXPECT_EQ(control2string(nullptr), nullptr);
+    for (std::string oid : {"", "1.2\nchangetype: delete", "1.2 true", "1.2:x", "1.2\x80"}) {
+        const LDAPControl control = {oid.data(), {}, 0};
+        const std::unique_ptr<char, release> written(control2string(&control));
+        EXPECT_EQ(written != nullptr, oid.empty()) << oid;
+    }
     ldap_controls_free(array);
 }
 
@@ -106,6 +112,10 @@ TEST(ControlText, ValuesComeFromFiles)
     const test_support::debug_catcher log;
     EXPECT_EQ(localfromfile("/nowhere/x", &value), -1);
     EXPECT_EQ(localfromfile(std::string(folder.path()).c_str(), &value), -1);
+    EXPECT_EQ(localfromfile("/dev/zero", &value), -1);
+    const std::string pipe = folder.path("pipe");
+    ASSERT_EQ(mkfifo(pipe.c_str(), 0600), 0);
+    EXPECT_EQ(localfromfile(pipe.c_str(), &value), -1);  // and doesn't wait for a writer
     EXPECT_TRUE(log.has("localfromfile: fopen error /nowhere/x\n"));
     EXPECT_EQ(value.bv_len, 7u);
     std::ofstream(path, std::ios::trunc).flush();

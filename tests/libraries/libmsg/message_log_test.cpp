@@ -14,6 +14,7 @@
 #include <vector>
 
 #include <fcntl.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/time.h>
 #include <sys/wait.h>
@@ -142,6 +143,47 @@ TEST(MessageLog, AFileIsMadePrivateAndAppendedToAndAFailureLeavesTheSinkAsItWas)
     EXPECT_EQ(set_message_file(folder.path("missing/log").c_str()), ENOENT);
     PrintMessage(MSG_COMPONENT_SERVER, MSG_SEVERE, 7);
     EXPECT_EQ(caught.count(), 1u);
+}
+
+TEST(MessageLog, ADescriptorThatFailsHalfWayOrIsMissingSpoilsNoOtherLine)
+{
+    const temp_dir folder;
+    const std::string path = folder.path("log");
+    const auto in_a_child = [](const auto& action) {
+        const pid_t pid = fork();
+        if (pid == 0) {
+            action();
+            _exit(0);
+        }
+        int status = -1;
+        EXPECT_EQ(waitpid(pid, &status, 0), pid);
+        EXPECT_EQ(status, 0);
+    };
+    in_a_child([&] {
+        std::signal(SIGXFSZ, SIG_IGN);
+        set_message_file(path.c_str());
+        PrintMessage(MSG_COMPONENT_SERVER, MSG_SEVERE, 7);
+        struct stat status = {};
+        stat(path.c_str(), &status);
+        const auto half = static_cast<rlim_t>(status.st_size + 10);
+        for (const rlimit& limit : {rlimit{half, RLIM_INFINITY}, {RLIM_INFINITY, RLIM_INFINITY}}) {
+            setrlimit(RLIMIT_FSIZE, &limit);
+            PrintMessage(MSG_COMPONENT_SERVER, MSG_SEVERE, 7);
+        }
+    });
+    const std::vector<std::string> lines = test_support::lines_of(folder.read("log"));
+    ASSERT_EQ(lines.size(), 3u);
+    EXPECT_EQ(lines[1], lines[1].substr(0, 10));
+    EXPECT_EQ(without_time(lines[2]), without_time(lines[0]));
+
+    in_a_child([&] {
+        close(STDERR_FILENO);
+        set_message_file(folder.path("first").c_str());
+        PrintMessage(MSG_COMPONENT_SERVER, MSG_SEVERE, 7);
+        set_message_sink(nullptr, nullptr);  // back to a standard error that isn't there
+        PrintMessage(MSG_COMPONENT_SERVER, MSG_SEVERE, 7);
+    });
+    EXPECT_EQ(test_support::lines_of(folder.read("first")).size(), 1u);
 }
 
 TEST(MessageLog, LoggingKeepsErrno)

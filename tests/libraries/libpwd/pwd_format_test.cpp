@@ -11,6 +11,7 @@
 #include <dlfcn.h>
 
 #include "libraries/libpwd/pwd_format.h"
+#include "tests/support/message_catcher.h"
 
 namespace {
 
@@ -61,6 +62,30 @@ bool verified(std::string password, std::string stored, int flags = 1, const aes
     const berval given = {password.size(), password.data()};
     const berval kept = {stored.size(), stored.data()};
     return verify_password(&given, &kept, flags, key) == 0;
+}
+
+TEST(PwdFormat, AStoredSettingChoosesItsCostWithinLimits)
+{
+    const auto platform = reinterpret_cast<char* (*)(const char*, const char*)>(dlsym(RTLD_DEFAULT, "crypt"));
+    ASSERT_NE(platform, nullptr);
+    for (const char* setting : {"ab", "_J9..K0Ay", "$1$abcdefgh$", "$3$", "$5$rounds=1000$abc$", "$6$rounds=1000$abc$",
+                                "$2b$04$abcdefghijklmnopqrstuu", "$sha1$1000$abcd$", "$md5,rounds=10$abcd$",
+                                "$7$4U..../....abcd$", "$y$j75$abcd$", "$y$j4T$abcd$", "$gy$j4T$abcd$"}) {
+        const char* const hash = platform("secret", setting);
+        if (hash != nullptr && hash[0] != '*') {  // a kind that the platform was built with
+            EXPECT_TRUE(verified("secret", std::string("{crypt}") + hash)) << hash;
+            EXPECT_FALSE(verified("Secret", std::string("{crypt}") + hash)) << hash;
+        }
+    }
+    const test_support::debug_catcher debug;
+    for (const char* setting :
+         {"_...9abcd", "$5$rounds=1000001$a$b", "$6$rounds=4294968296$a$b", "$2b$15$abcdefghijklmnopqrstuu",
+          "$sha1$1000001$a$b", "$md5,rounds=100001$a$b", "$7$DU..../....a$b", "$7$CU/.../....a$b", "$7$CU....0....a$b",
+          "$y$jCT$a$b", "$y$jBTx$a$b", "$y$j.......$a$b", "$gy$jCT$a$b", "$z$a$b"}) {
+        const std::size_t told = debug.count();
+        EXPECT_FALSE(verified("secret", std::string("{crypt}") + setting)) << setting;
+        EXPECT_EQ(debug.count(), told + 1) << setting;
+    }
 }
 
 TEST(PwdFormat, ThePrefixAloneTellsTheMethod)

@@ -20,7 +20,9 @@ struct Backend {
     Backend* be_next DIRBASE_DEFAULT(nullptr);  // next on the list
 
     // What stands in front of the names of a relational store's tables, for example their owner, and the table that
-    // holds entry-level attributes. The texts stay with the back end; null stands for none, and for LDAP_ENTRY.
+    // holds entry-level attributes. The texts stay with the back end; null stands for none, and for LDAP_ENTRY. They
+    // are called while names in the store are worked out: at the start, and in each vote on its thread, under the write
+    // side of the schema lock, which they don't take.
     backend_text_function be_table_qualifier DIRBASE_DEFAULT(nullptr);
     backend_text_function be_entry_table DIRBASE_DEFAULT(nullptr);
 
@@ -36,7 +38,8 @@ DIRBASE_C_BEGIN
 // Head of the list.
 DIRBASE_EXPORT extern Backend* g_backends;
 
-// The kind of server: 1 for one without tables, 2, the value at start, for one with a relational back end.
+// The kind of server: 2, the value at start, for one with a relational back end ("rdbm" is on the list); 1 for one
+// without tables ("proxy" is on the list). Without that back end ldcf_api_schema_complete_db_names fails.
 DIRBASE_EXPORT extern int g_srvType;
 
 // The first back end of a list whose type is `type`, without regard to case; null when there is none or type is null.

@@ -4,8 +4,9 @@
 // array without elements is one too. No array knows its room: each addition counts the elements and makes the array
 // fit.
 //
-// Functions that add return 0, or LDAP result 90 when memory ran out, which is told to the debug log; array and
-// arguments are then as they were. Nothing here locks: the caller serialises changes of an array.
+// Functions that add return LDAP_SUCCESS, or LDAP_NO_MEMORY when memory ran out, which is told to the debug log; array
+// and arguments are then as they were. No text, and no place for an index, may be null. Nothing here locks: the caller
+// serialises changes of an array.
 #pragma once
 
 #include "libraries/dirbase_export.h"

@@ -49,8 +49,8 @@ DIRBASE_EXPORT int getline_and_xlate(char* buffer, FILE* file);
 //   output  takes a new text for the caller to free(), or null when there is none.
 //   length  takes the number of bytes of the new text, its terminator included, or 0 when there is none.
 //
-// Return 0; 90 (no memory); or -1 after logging it, when the input is not a text of its code page, holds a character
-// that the other one lacks, or grows to more than three times its size.
+// Return LDAP_SUCCESS; LDAP_NO_MEMORY; or -1 after logging it, when the input is not a text of its code page, holds a
+// character that the other one lacks, or grows to more than three times its size.
 DIRBASE_EXPORT int xlate_localcp_to_utf8(const char* input, char** output, size_t* length);
 DIRBASE_EXPORT int xlate_utf8_to_localcp(const char* input, char** output, size_t* length);
 

@@ -77,8 +77,8 @@ public:
             pthread_cond_init(&condition_, nullptr);
     }
 
-    // Append a value at the tail, `add` with the mutex held for as long as that takes. Return 0, or LDAP result 90 when
-    // memory ran out, with the list as it was. A first entry wakes all waiters.
+    // Append a value at the tail, `add` with the mutex held for as long as that takes. Return LDAP_SUCCESS, or
+    // LDAP_NO_MEMORY, with the list as it was. A first entry wakes all waiters.
     int add(T value)
     {
         pthread_mutex_lock(&mutex_);

@@ -44,7 +44,7 @@ int value_encode_one_value(int method, const berval* value, berval* out, const a
     }
 
     if (out == value) {
-        std::free(out->bv_val);
+        wipe_and_free(out->bv_val, out->bv_len);
     }
     buffer.get()[length] = '\0';
     *out = {length, buffer.release()};
@@ -71,7 +71,7 @@ int value_encode_values(int method, berval** values, int freeOld, const aes_key_
             continue;
         }
         if (freeOld != 0) {
-            std::free(value.bv_val);
+            wipe_and_free(value.bv_val, value.bv_len);
         }
         value = encoded;
     }

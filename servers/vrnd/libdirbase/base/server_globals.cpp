@@ -4,9 +4,11 @@
 #include <atomic>
 #include <cstdlib>
 #include <cstring>
+#include <mutex>
 
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libvrnutil/vrn_text.h"
+#include "libraries/mutex_holder.h"
 #include "servers/vrnd/libdirbase/base/charray.h"
 
 unsigned char g_allow_anon = 1;
@@ -92,16 +94,11 @@ pthread_mutex_t write_block_lock = PTHREAD_MUTEX_INITIALIZER;
 pthread_mutex_t anon_lock = PTHREAD_MUTEX_INITIALIZER;
 pthread_mutex_t g_strerrMutex = PTHREAD_MUTEX_INITIALIZER;
 
-class lock_guard {
-public:
-    explicit lock_guard(pthread_mutex_t& mutex) : mutex_(mutex) { pthread_mutex_lock(&mutex_); }
-    ~lock_guard() { pthread_mutex_unlock(&mutex_); }
-    lock_guard(const lock_guard&) = delete;
-    lock_guard& operator=(const lock_guard&) = delete;
-
-private:
-    pthread_mutex_t& mutex_;
-};
+void make_anew(pthread_mutex_t& mutex)
+{
+    pthread_mutex_destroy(&mutex);
+    pthread_mutex_init(&mutex, nullptr);
+}
 
 // By value.
 constexpr const char* alias_words[] = {"never", "search", "find", "always"};
@@ -166,7 +163,7 @@ unsigned char get_transactionsEnabled(void)
 
 void set_write_timeout(std::int64_t timeout)
 {
-    const lock_guard lock(write_block_lock);
+    const mutex_holder lock(write_block_lock);
     g_write_timeout.store(timeout, std::memory_order_relaxed);
 }
 
@@ -177,20 +174,23 @@ std::int64_t get_write_timeout(void)
 
 void set_allow_anon(unsigned char allow)
 {
-    const lock_guard lock(anon_lock);
+    const mutex_holder lock(anon_lock);
     g_allow_anon = allow;
 }
 
 bool get_allow_anon(void)
 {
-    const lock_guard lock(anon_lock);
+    const mutex_holder lock(anon_lock);
     return g_allow_anon != 0;
 }
 
 void initDOSLocks(void)
 {
-    pthread_mutex_init(&write_block_lock, nullptr);
-    pthread_mutex_init(&anon_lock, nullptr);
+    static std::once_flag once;
+    std::call_once(once, [] {
+        make_anew(write_block_lock);
+        make_anew(anon_lock);
+    });
 }
 
 void free_objclass(objclass* record)
@@ -215,12 +215,13 @@ void free_objclass_list(void)
 
 void vrn_strerror_init(void)
 {
-    pthread_mutex_init(&g_strerrMutex, nullptr);
+    static std::once_flag once;
+    std::call_once(once, [] { make_anew(g_strerrMutex); });
 }
 
 char* vrn_strerror(int error)
 {
-    const lock_guard lock(g_strerrMutex);
+    const mutex_holder lock(g_strerrMutex);
     return strdup(std::strerror(error));
 }
 

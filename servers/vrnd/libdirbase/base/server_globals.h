@@ -1,8 +1,9 @@
 // The settings of the server that all of its loadable parts share at one address, and a few helpers beside them.
 //
 // The front end sets them at start-up, before other threads read them, and they keep their values until the process
-// ends; nothing here locks except where it says so. Texts and records belong to whoever sets the pointer. The list of
-// back ends and the kind of server are in backend.h.
+// ends; nothing here locks except where it says so. The library itself reads only get_g_language_tags_enabled; the rest
+// is kept for front end, back ends and plug-ins, who agree on its meaning. Texts and records belong to whoever sets the
+// pointer. The list of back ends and the kind of server are in backend.h.
 #pragma once
 
 #include <stdbool.h>
@@ -62,7 +63,8 @@ DIRBASE_EXPORT extern unsigned char g_allow_anon;
 DIRBASE_EXPORT void set_allow_anon(unsigned char allow);
 DIRBASE_EXPORT bool get_allow_anon(void);
 
-// Makes the locks of the two settings above. Called once at start-up, before another thread runs.
+// Makes the locks of the two settings above, which are there from the first moment: a server needn't call it. The first
+// call, at start-up before another thread runs, makes them anew; later ones do nothing.
 DIRBASE_EXPORT void initDOSLocks(void);
 
 // ---- settings for all to read ---------------------------------------------------------------------------------------
@@ -158,7 +160,7 @@ DIRBASE_EXPORT void free_objclass_list(void);
 
 // ---- helpers --------------------------------------------------------------------------------------------------------
 
-// Makes the lock of vrn_strerror. Called once at start-up, before another thread runs.
+// Makes the lock of vrn_strerror, in the same manner.
 DIRBASE_EXPORT void vrn_strerror_init(void);
 
 // Returns the platform's text for an errno in a new text for the caller to free(); null when memory ran out. Any

@@ -21,8 +21,8 @@ DIRBASE_EXPORT extern const char* const instancePrefix;
 //   name       of the instance.
 //   directory  where the folders of instances are, with a separator at its end.
 //
-// A null argument, a missing piece, one of another kind and memory running out give false; what was found is told to
-// the debug log.
+// A null argument, a missing piece, one of another kind and memory running out give false. A piece of another kind and
+// a folder that can't be looked at are told to the debug log, memory running out to the message log.
 DIRBASE_EXPORT bool doesInstanceExist(const char* name, const char* directory);
 
 // True.

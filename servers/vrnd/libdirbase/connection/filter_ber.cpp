@@ -14,6 +14,7 @@
 #include "libraries/libber/ldap_result.h"
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libmsg/message_log.h"
+#include "libraries/libpwd/pwd_format.h"
 #include "libraries/libvrnutil/vrn_text.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/password_values.h"
@@ -27,7 +28,6 @@
 
 namespace {
 
-constexpr int encryption_two_way = 0x80;
 constexpr ber_tag_t constructed = 0x20;
 constexpr std::size_t first_room = 128;      // of a text
 constexpr std::size_t longest_shown = 8100;  // of a value in the debug log
@@ -174,7 +174,7 @@ int read_assertion(const Connection* conn, BerElement* ber, ava& assertion, std:
     if (result == LDAP_SUCCESS) {
         result = value_normalize_berval(&assertion.ava_value, syntax, 0);
     }
-    if (result == LDAP_SUCCESS && (info->encryption & encryption_two_way) != 0) {
+    if (result == LDAP_SUCCESS && (info->encryption & PWD_TWO_WAY) != 0) {
         result = value_encode_one_value(info->encryption, &assertion.ava_value, &assertion.ava_encoded, nullptr);
     }
     if (result != LDAP_SUCCESS) {
@@ -255,6 +255,9 @@ int read_pieces(const filter_source& from, const asyntaxinfo* info, filter_subst
     substring_pieces inner;
     char* last = nullptr;
     ber_len_t length = 0;
+    if (ber_peek_tag(from.ber, &length) != LBER_SEQUENCE) {  // there is more that can be entered
+        return malformed("get_substring_filter");
+    }
     ber_tag_t tag = ber_first_element(from.ber, &length, &last);
     if (tag == LBER_DEFAULT) {
         return malformed("get_substring_filter");  // there is one piece at least

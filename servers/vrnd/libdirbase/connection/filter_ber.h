@@ -3,7 +3,8 @@
 // While a filter is read its values are normalised by the syntax of their attribute, and what the attribute's rules
 // forbid is refused. What can't be evaluated, since the schema doesn't know the attribute or the value can't be one of
 // its values, is undefined and not a failure: it is left out of an OR, and makes an AND or a NOT undefined as a whole.
-// An undefined filter is LDAP_SUCCESS with no filter: such a search finds nothing.
+// An undefined filter is LDAP_SUCCESS with no filter: such a search finds nothing. An AND or OR without a defined
+// member is undefined, so an empty one is, too (it isn't the absolute true or false of RFC 4526).
 //
 // Reading takes time and memory in proportion to the encoding and to its depth, which is FILTER_MAX_DEPTH at most. All
 // lengths are held against the construction that they stand in; unknown members at the end of an assertion are passed
@@ -30,7 +31,7 @@ DIRBASE_C_BEGIN
 //   conn        whose request it is; null for none (nothing is known about it then: it counts as not secure)
 //   filter      takes a new filter for filter_free; null when it is undefined and on failure
 //   text        takes its canonical text for logs, with "(", ")", "*" and backslash of values written as a backslash
-//               and two hexadecimal digits; null when there is no filter
+//               and two hexadecimal digits, and values up to their first byte 0; null when there is no filter
 //   error_text  may be null. Where a failure has words for the client takes a new text, without a look at what was
 //               there, and is left alone else.
 //
@@ -73,15 +74,17 @@ DIRBASE_EXPORT int get_substring_filter(const Connection* conn, BerElement* ber,
 DIRBASE_EXPORT int get_ava_for_filter(const Connection* conn, BerElement* ber, ava* assertion, uint64_t choice,
                                       char** error_text);
 
-// Reads the assertion of a compare request: a value that its syntax refuses is taken as it is. Returns LDAP_SUCCESS, or
-// LDAP_PROTOCOL_ERROR with message 5 and the assertion zeroed.
+// Reads the assertion of a compare request: a value that its syntax refuses is taken as it is. Returns LDAP_SUCCESS,
+// with the assertion for ava_free(assertion, 0); or LDAP_PROTOCOL_ERROR, also without memory, with message 5 and the
+// assertion zeroed.
 DIRBASE_EXPORT int get_ava(BerElement* ber, ava* assertion);
 
 // Whether a filter of this choice may be put to an attribute on this connection. get_filter asks for all choices but
 // presence.
 //
 //   info        null, for an attribute that isn't known, permits all
-//   error_text  may be null. Takes words for the client, a new block of 1000 bytes, when it is refused.
+//   error_text  may be null. Takes words for the client, a new block of 1000 bytes, when it is refused; null without
+//               memory.
 //
 // Returns LDAP_SUCCESS; LDAP_UNWILLING_TO_PERFORM for anything but presence of an attribute encrypted one way, anything
 // but presence and equality of one encrypted two ways, and an attribute that isn't to be matched;

@@ -3,13 +3,12 @@
 
 #include "libraries/libber/ldap_result.h"
 #include "libraries/libmsg/message_log.h"
+#include "libraries/libpwd/pwd_format.h"
 #include "servers/vrnd/libdirbase/connection/filter_ber.h"
 
 namespace {
 
 constexpr std::size_t error_text_size = 1000;
-constexpr int encryption_none = 1;
-constexpr int encryption_two_way = 0x80;
 
 }  // namespace
 
@@ -20,13 +19,13 @@ extern "C" int filter_check_attr_constraints(const Connection* conn, std::uint64
     if (info == nullptr || (!is_presence && choice != LDAP_FILTER_SUBSTRINGS && !filter_has_ava(choice))) {
         return LDAP_SUCCESS;
     }
-    const bool two_way = (info->encryption & encryption_two_way) != 0;
+    const bool two_way = (info->encryption & PWD_TWO_WAY) != 0;
     const bool is_secure = conn != nullptr && (conn->c_bind_state != 0 || conn->c_ssl != 0 || conn->c_audit_flag != 0);
     int result = LDAP_UNWILLING_TO_PERFORM;
     int message = 0;
     if (two_way && !is_presence && choice != LDAP_FILTER_EQUALITY) {
         message = 157;
-    } else if (!two_way && info->encryption != encryption_none && !is_presence) {
+    } else if (!two_way && info->encryption != PWD_NONE && !is_presence) {
         message = 158;
     } else if (info->non_matchable != 0) {
         message = 159;

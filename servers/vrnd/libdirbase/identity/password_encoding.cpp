@@ -1,9 +1,9 @@
 // Password methods, password attributes and the form of the policy response: see password_encoding.h.
 #include "servers/vrnd/libdirbase/identity/password_encoding.h"
 
-#include "libraries/libber/ldap_env.h"
 #include "libraries/libpwd/pwd_format.h"
 #include "libraries/libvrnutil/vrn_text.h"
+#include "servers/vrnd/libdirbase/base/environment.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
 
 const password_type g_password_types[3] = {{1, "USERPASSWORD", 12}, {2, "SECRETKEY", 9}, {0, nullptr, 0}};
@@ -37,7 +37,7 @@ int convertPWEncryptionMethod(const char* text, int* out)
 int using_openldap_pwdpolicy_response(void)
 {
     static const int form = [] {
-        const heap_text value(ldap_getenv("USE_OPENLDAP_PWDPOLICY_CONTROL"));
+        const heap_text value = environment_value("USE_OPENLDAP_PWDPOLICY_CONTROL");
         if (value == nullptr) {
             return 0;
         }

@@ -5,7 +5,9 @@
 
 #include "libraries/libber/ldap_result.h"
 #include "libraries/libmsg/debug_log.h"
+#include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/password_values.h"
+#include "servers/vrnd/libdirbase/model/attr_records.h"
 #include "servers/vrnd/libdirbase/model/attr_value_tree.h"
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/value_add.h"
@@ -18,7 +20,7 @@ bool is_encrypted(const Attribute& attr)
 }
 
 struct free_values {
-    void operator()(berval** values) const noexcept { ber_bvecfree(values); }
+    void operator()(berval** values) const noexcept { free_secret_values(values); }
 };
 
 // A copy of a value, decoded where that can be done; null when memory ran out.
@@ -31,7 +33,7 @@ berval* decoded_copy(const berval& value)
     }
     auto* copy = static_cast<berval*>(std::malloc(sizeof(berval)));
     if (copy == nullptr) {
-        std::free(clear.bv_val);
+        wipe_and_free(clear.bv_val, clear.bv_len);
     } else {
         *copy = clear;
     }
@@ -39,6 +41,15 @@ berval* decoded_copy(const berval& value)
 }
 
 }  // namespace
+
+void free_secret_values(berval** values)
+{
+    for (berval** value = values; value != nullptr && *value != nullptr; ++value) {
+        wipe_and_free((*value)->bv_val, (*value)->bv_len);
+        std::free(*value);
+    }
+    std::free(values);
+}
 
 extern "C" {
 

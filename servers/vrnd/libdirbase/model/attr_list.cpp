@@ -420,7 +420,7 @@ void attr_free_normvals(Attribute* attr)
 void attr_free_decodedvals(Attribute* attr)
 {
     if (attr != nullptr) {
-        ber_bvecfree(std::exchange(attr->a_decoded, nullptr));
+        free_secret_values(std::exchange(attr->a_decoded, nullptr));
     }
 }
 

@@ -4,11 +4,11 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "libraries/libber/ldap_env.h"
 #include "libraries/libber/ldap_result.h"
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libmsg/message_log.h"
 #include "libraries/libvrnutil/vrn_text.h"
+#include "servers/vrnd/libdirbase/base/environment.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/oid_prefix.h"
 #include "servers/vrnd/libdirbase/base/server_globals.h"
@@ -244,7 +244,7 @@ avl_node* attr_syntaxes_get(void)
 int convertAttrLowerCase(void)
 {
     static const int answer = [] {
-        const heap_text value(ldap_getenv("XANLDAP_ATTRLOWERCASE"));
+        const heap_text value = environment_value("XANLDAP_ATTRLOWERCASE");
         const bool off =
             value != nullptr && (vrn_strcasecmp(value.get(), "FALSE") == 0 || vrn_strcasecmp(value.get(), "NO") == 0);
         return off ? 0 : 1;

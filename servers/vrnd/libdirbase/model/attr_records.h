@@ -36,3 +36,8 @@ int attr_merge_record(Entry& entry, const char* name, asyntaxinfo* info, Attribu
 
 // Adds values to it.
 int attr_merge_values(Attribute& attr, berval** values, int drop_duplicates, int tree_mode);
+
+// ---- values in the clear --------------------------------------------------------------------------------------------
+
+// Releases a null-terminated array of values, each wiped first. Null does nothing.
+void free_secret_values(berval** values);

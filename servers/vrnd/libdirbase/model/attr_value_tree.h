@@ -38,8 +38,9 @@ DIRBASE_EXPORT void free_AttrvalsNorm(AttrvalsNorm* node);
 // Whether an attribute has a value: 0 when it has, 1 when it hasn't, -1 when that can't be told, since there is no tree
 // or the value is none of the syntax (or memory ran out); the caller then looks for himself.
 //
-//   syntax the code of the tree's nodes, which is the attribute's; with SC_BIN the values are compared byte for byte,
-//   one after the other, and the tree isn't used normalize 0: `value` is in normal form already
+//   syntax     the code of the tree's nodes, which is the attribute's; with SC_BIN the values are compared byte for
+//              byte, one after the other, and the tree isn't used
+//   normalize  0: `value` is in normal form already
 //
 // The value "default" of `ownersource` and `aclsource` is found as it is stored, without being normalised
 // (value_add.h).

@@ -46,7 +46,8 @@ DIRBASE_C_BEGIN
 // Adds values to an entry under a name, which makes the record where it isn't there. Values are copied.
 //
 //   name             with a language tag or none. A name in numeric form, or with "oid." in front, is stored as the
-//                    schema's first name, where there is one, with the tag behind it.
+//                    schema's first name, where there is one, with the tag behind it. One that the schema doesn't
+//                    know is stored as it is, with SC_CIS.
 //   values           null-terminated; null for none.
 //   drop_duplicates  1: values that are there already are passed over, without a failure.
 //   tree_mode        0: without drop_duplicates no value tree (one that was there is dropped, for it would lack the new
@@ -65,7 +66,7 @@ DIRBASE_EXPORT int attr_merge(Entry* entry, const char* name, berval** values, i
 // The same for a back end that loads very many values: nothing is checked, normalised or put in a tree, and the name is
 // looked for only once.
 //
-//   old_count  how many values the caller has added so far. The record's own count is what new values go behind.
+//   old_count  has no effect: new values go behind those that the record counts.
 //   added      how many there are in `values`, none of them null.
 //   capacity   room of the value array in pointers, kept for the caller between calls; 0 at the first.
 //   attr       *attr is null at the first call and the record from then on.

@@ -165,9 +165,9 @@ DIRBASE_EXPORT const char* find_end_attr_value33(const char** start, const char*
 // memory.
 DIRBASE_EXPORT char* normAttrValue(const char* value, int* error);
 
-// The schema's first name, the shortest, of an attribute by any name or OID, and its record; null for an unknown one,
-// and without memory for its record.
-// The name belongs to the record.
+// The schema's first name, the shortest, of an attribute by any name or OID; null for an unknown one, and without
+// memory for its record. `info` takes the record, or null. The name belongs to the record. The caller holds the read
+// side of the schema lock.
 DIRBASE_EXPORT const char* FirstRDNType_and_syntax(const char* type, asyntaxinfo** info);
 
 // Whether a character of a value has to be escaped, and whether it may be: 1 or 0.

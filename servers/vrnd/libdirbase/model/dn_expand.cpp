@@ -56,22 +56,22 @@ int add_type_value_pair(Entry* entry, char* rdn)
     return add_attr_to_entry_and_checkdup(entry, rdn, value.get());
 }
 
-// The end of the pair at `at` of a cleaned DN: a separator or the end of the text. A backslash hides the character
-// behind it, and a value that begins with a quote runs to the next one.
+// The end of the pair at `at` of a cleaned DN: a separator in the value, but for its first character, or the end of the
+// text. A backslash hides the character behind it, and a value that begins with a quote runs to the next one.
 char* find_pair_end(char* at)
 {
-    at += std::strcspn(at, "=,;+");
-    if (*at != '=') {
+    at += std::strcspn(at, "=");
+    if (*at == '\0') {
         return at;
     }
-    ++at;
+    const char* const value = ++at;
     bool quoted = *at == '"';
     for (at += quoted ? 1 : 0; *at != '\0'; ++at) {
         if (*at == '\\' && at[1] != '\0') {
             ++at;
         } else if (quoted) {
             quoted = *at != '"';
-        } else if (*at == ',' || *at == ';' || *at == '+') {
+        } else if ((*at == ',' || *at == ';' || *at == '+') && at != value) {
             break;
         }
     }

@@ -3,8 +3,8 @@
 
 #include <cstring>
 
-#include "libraries/libber/ldap_env.h"
 #include "libraries/libmsg/debug_log.h"
+#include "servers/vrnd/libdirbase/base/environment.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/oid_prefix.h"
 #include "servers/vrnd/libdirbase/model/dn_chars.h"
@@ -378,7 +378,7 @@ dn_resolved resolve_value(const char* at, const char* end, char* out, dn_form fo
 bool older_dn_processing()
 {
     static const bool on = [] {
-        const heap_text set(ldap_getenv("VRND_V4_DN_PROCESSING"));
+        const heap_text set = environment_value("VRND_V4_DN_PROCESSING");
         if (set != nullptr) {
             debug_error("WARNING!!! Setting DN processing to V4 style.\n");
             debug_error("V4 DN Processing should only be enabled to correct migration issues.\n");

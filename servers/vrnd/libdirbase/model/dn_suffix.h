@@ -12,12 +12,13 @@ typedef struct Backend Backend;
 
 DIRBASE_C_BEGIN
 
-// Whether the suffix ends the DN: it is the whole DN, or all behind one of its ",". The first compares copies in upper
-// case and gives false without memory, the second the texts as they are. False for a null text.
+// Whether the suffix ends the DN: it is the whole DN, or all behind one of its ",". So the empty suffix ends the empty
+// DN only. The first compares copies in upper case (utfToUpper), which are otherwise as written, and gives false
+// without memory, the second the texts as they are. False for a null text.
 DIRBASE_EXPORT bool dn_issuffix(const char* dn, const char* suffix);
 DIRBASE_EXPORT bool dn_issuffix_norm(const char* dn, const char* suffix);
 
-// Whether one of two normalised DNs is the other or a descendant of it.
+// Whether one of two normalised DNs is the other or a descendant of it; the empty one has no descendants here.
 DIRBASE_EXPORT bool are_nested_dn(const char* a, const char* b);
 
 // Whether a text is a DN, that is holds "=", and no plain name.

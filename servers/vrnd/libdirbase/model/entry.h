@@ -1,4 +1,8 @@
 // The entry: a DN, its normal form, and the attributes, each of them a record on two lists (attribute.h).
+//
+// An entry is changed by one thread at a time; while nobody changes it any number of threads may read. What takes the
+// name of an attribute looks it up: the caller holds the read side of the schema lock
+// (ldcf_api_get_modify_attr_info_lock_g).
 #pragma once
 
 #include <stdbool.h>
@@ -71,8 +75,8 @@ DIRBASE_EXPORT bool verify_attribute(const Entry* entry, const char* name, const
 // tree keeps them: it is the caller's to mend, by delete_valuetree_value. Decoded values are dropped with the first
 // that goes. An attribute may be left with no values.
 //
-// Returns LDAP_SUCCESS, or LDAP_NO_SUCH_ATTRIBUTE for an attribute or value that isn't there; the values before it are
-// gone then, and those behind it are left.
+// Returns LDAP_SUCCESS, or LDAP_NO_SUCH_ATTRIBUTE for an attribute or value that isn't there, a null argument, and
+// without memory to look the name up; the values before it are gone then, and those behind it are left.
 DIRBASE_EXPORT int delete_values_from_entry(Entry* entry, const LDAPMod* mod);
 
 // Releases the nodes of a value tree with their values. Null does nothing. Returns 0.

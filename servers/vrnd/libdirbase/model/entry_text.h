@@ -6,9 +6,9 @@
 //     objectclass: person                a line for each value, the values of one attribute one after the other
 //     cn:: TWFyw61h
 //
-// Attributes stand in their order of arrival under the names that they are stored with. A text ends with its last line
-// feed; in reading, an empty line ends it too. In the form without members each of `member` and `uniqueMember` is one
-// line with the value "CN=NULL".
+// Attributes stand in their order of arrival under the names that they are stored with. An entry without a DN has no dn
+// line, and such a text makes no entry. A text ends with its last line feed; in reading, an empty line ends it too. In
+// the form without members each of `member` and `uniqueMember` is one line with the value "CN=NULL".
 //
 // Whoever calls holds the read side of the schema lock. An entry that is written isn't changed by anyone meanwhile.
 // Texts go to a buffer of the caller's, and then any number of threads may write at once, or to the global one, and
@@ -29,7 +29,8 @@ DIRBASE_C_BEGIN
 
 // Makes an entry of a text.
 //
-//   text              zero-terminated; changed
+//   text              zero-terminated; changed. Lines end in a line feed alone: a carriage return belongs to the line
+//                     (line64.h).
 //   check_duplicates  as drop_duplicates of attr_merge
 //   normalize         as tree_mode of attr_merge
 //   trim              not 0: lines of `member` and `uniqueMember` set their flag of e_flag, and are left out when their
@@ -59,7 +60,7 @@ DIRBASE_EXPORT char* entry2str(const Entry* entry, size_t* length, int print_id)
 //   print_id  not 0: with the id line; values of type-only attributes are written all the same
 //   buffer    null for the global buffer. Else *buffer is a block of malloc, or null, and takes the one that it has
 //             become, which stays the caller's, also after a failure.
-//   size      of *buffer, 0 for a null one; takes the new one. Not used for the global buffer.
+//   size      of *buffer, 0 for a null one; takes the new one. Not used for the global buffer, else not null.
 //   ignored   has no effect
 //
 // The second form also leaves out what keeps the password state (pwdChangedTime, pwdAccountLockedTime,

@@ -13,10 +13,10 @@
 #include <mutex>
 #include <string_view>
 
-#include "libraries/libber/ldap_env.h"
 #include "libraries/libber/ldap_result.h"
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libvrnutil/vrn_text.h"
+#include "servers/vrnd/libdirbase/base/environment.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/base/password_values.h"
 #include "servers/vrnd/libdirbase/base/syntax_codes.h"
@@ -354,7 +354,7 @@ int test_node(const Entry* entry, const Filter* filter)
 
 void read_environment()
 {
-    const heap_text value(ldap_getenv("OC_ALIAS"));
+    const heap_text value = environment_value("OC_ALIAS");
     check_oc_alias = value != nullptr && vrn_strcasecmp(value.get(), "YES") == 0;
 }
 

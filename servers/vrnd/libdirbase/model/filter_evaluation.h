@@ -46,7 +46,8 @@ DIRBASE_EXPORT int test_filter_list(const Entry* entry, const Filter* first, uin
 // stored form of either. Where value_cmp can't compare, as with a bad time, the stored value counts as the greater one.
 DIRBASE_EXPORT int test_ava_filter(const Entry* entry, const ava* assertion, uint64_t choice);
 
-// Whether the entry has a version of the attribute; false for null arguments, and without memory to look the name up.
+// FILTER_TRUE when the entry has a version of the attribute, else FILTER_FALSE, also for null arguments and without
+// memory to look the name up.
 DIRBASE_EXPORT int test_presence_filter(const Entry* entry, const char* type);
 
 // Approximate match: the phonetic codes, from the first word on, are the same.

@@ -24,9 +24,9 @@ DIRBASE_C_BEGIN
 
 // Splits a name at its last ";". A name without a tag gives nothing.
 //
-//   name      not null
 //   base      takes a new text for the caller to free(), null when there is no tag; may be null in mode LANGUAGE_TAG
-//   tag       may be null in mode LANGUAGE_BASE. Else, with `allocate` 0, *tag is a buffer of language_tag_buffer
+//             only
+//   tag       may be null in mode LANGUAGE_BASE only. Else, with `allocate` 0, *tag is a buffer of language_tag_buffer
 //             bytes, left alone when there is no tag; with `allocate` 1 *tag takes a new text for the caller to free(),
 //             or null.
 //

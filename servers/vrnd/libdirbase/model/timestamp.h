@@ -5,7 +5,7 @@
 // Time must have its seconds, that 60 is no second, and that a zone has four digits; they are wider in that a text
 // without a zone is a local time, and that any four digits make an offset.
 //
-// A text is refused with LDAP result 21 (invalid syntax). So is a null text, and one of more than 29 characters. The
+// A text is refused with LDAP_INVALID_SYNTAX. So is a null text, and one of more than 29 characters. The
 // debug log tells which field was bad, except for these two, the zone, and a day that is past the end of its month.
 // Nothing here locks, and every function may be called from any thread. Local times and the present year follow the
 // process's time zone: no thread may change the variable TZ meanwhile.
@@ -38,7 +38,8 @@ static_assert(sizeof(tag_timestamp_struct) == 16 && offsetof(tag_timestamp_struc
 
 DIRBASE_C_BEGIN
 
-// Whether the month has the day: 0 or 21. `time` isn't null; year and month have been checked already.
+// Whether the month has the day: LDAP_SUCCESS or LDAP_INVALID_SYNTAX. `time` isn't null; year and month have been
+// checked already.
 DIRBASE_EXPORT int check_date(const tag_timestamp_struct* time);
 
 // Brings a time to UTC.
@@ -47,8 +48,8 @@ DIRBASE_EXPORT int check_date(const tag_timestamp_struct* time);
 //   zone  what followed the time in the text. "Z": it is UTC already. A sign and four digits: it is that many hours and
 //         minutes ahead of UTC, or behind. Nothing: it is local, and never daylight-saving, time.
 //
-// Returns 0, or 21 for another zone; the record is then as it was. A local time before 1970 can't be told in UTC: the
-// record stays, with a line in the debug log, and the result is 0.
+// Returns LDAP_SUCCESS, or LDAP_INVALID_SYNTAX for another zone; the record is then as it was. A local time before 1970
+// can't be told in UTC: the record stays, with a line in the debug log, and the result is 0.
 //
 // Of an offset beyond 23 hours or 59 minutes, each field passes at most one unit to the next, so that fields may end up
 // outside their ranges.
@@ -60,7 +61,7 @@ DIRBASE_EXPORT int adjust_to_UTC(tag_timestamp_struct* time, const char* zone);
 //   time  receives the time; null to check the text only. When only the zone is bad it receives the time as written,
 //         and else nothing on failure.
 //
-// Returns 0 or 21.
+// Returns LDAP_SUCCESS or LDAP_INVALID_SYNTAX.
 DIRBASE_EXPORT int str2GeneralizedTime(const char* text, tag_timestamp_struct* time);
 
 // Reads YYMMDDHHMM, then SS if any, then a zone or none. The two digits stand for a
@@ -68,7 +69,7 @@ DIRBASE_EXPORT int str2GeneralizedTime(const char* text, tag_timestamp_struct* t
 //
 //   time  receives the time, on success only; null to check the text only.
 //
-// Returns 0, 21, or 1 (operations error) when the system's clock can't be read.
+// Returns LDAP_SUCCESS, LDAP_INVALID_SYNTAX, or LDAP_OPERATIONS_ERROR when the system's clock can't be read.
 DIRBASE_EXPORT int str2UTCTime(const char* text, tag_timestamp_struct* time);
 
 // Reads a text of syntax SC_GT or SC_UTCT into a new record for the caller to free().

@@ -188,8 +188,7 @@ void free_dup_vals(berval** values, berval** copies)
 {
     for (std::size_t i = 0; copies != nullptr && copies[i] != nullptr; ++i) {
         if (copies[i] != values[i]) {
-            explicit_bzero(copies[i]->bv_val, copies[i]->bv_len);
-            std::free(copies[i]->bv_val);
+            wipe_and_free(copies[i]->bv_val, copies[i]->bv_len);
         }
     }
     std::free(copies);

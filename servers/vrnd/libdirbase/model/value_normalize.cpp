@@ -133,6 +133,13 @@ int normalize_in_place(char* text, std::uint32_t syntax, const refusal_lines& li
     return LDAP_SUCCESS;
 }
 
+// Whether the rule may refuse a text.
+bool has_form(std::uint32_t syntax)
+{
+    return (syntax & SC_DN) != 0 ||
+           ((syntax & SC_TEL) == 0 && (syntax & (SC_BIT_STRING | SC_NUMERIC_STRING | SC_COUNTRY_STRING)) != 0);
+}
+
 // The normal form of a DN in a new text; null with the failure in *result.
 heap_text normal_dn(const char* dn, int* result)
 {
@@ -195,6 +202,10 @@ int value_normalize_berval(berval* value, std::uint32_t syntax, int embedded)
     }
     char empty[] = "";
     char* const text = value->bv_val == nullptr ? empty : value->bv_val;
+    if (has_form(syntax) && std::strlen(text) < value->bv_len) {  // what is behind a byte 0 is of no form
+        refuse("Error - value_normalize_berval: byte 0 behind %s\n", text);
+        return (syntax & SC_DN) != 0 ? LDAP_INVALID_DN_SYNTAX : LDAP_INVALID_SYNTAX;
+    }
     if ((syntax & SC_DN) != 0) {
         return normalize_dn(value, text, embedded != 0);
     }

@@ -11,8 +11,9 @@
 //     none of these      utfToUpper; spaces stay, and from bytes on that aren't UTF-8 everything does
 //
 // A text ends at its first zero byte, and the zero byte behind a value's counted bytes is relied on: ber_bvdup puts one
-// there. Results: LDAP_SUCCESS; LDAP_INVALID_SYNTAX with a line in the debug log for a text that the rule refuses; what
-// dn_normalize_esc has for a DN; LDAP_NO_MEMORY. A refused text is left as it was.
+// there. A value with a zero byte among those is refused where the rule may refuse a text. Results: LDAP_SUCCESS;
+// LDAP_INVALID_SYNTAX with a line in the debug log for a text that the rule refuses; what dn_normalize_esc has for a
+// DN; LDAP_NO_MEMORY. A refused text is left as it was.
 //
 // Any thread may call these on texts of its own. For DNs it holds the read side of the schema lock.
 #pragma once
@@ -33,7 +34,8 @@ DIRBASE_EXPORT int value_normalize(char** text, uint32_t syntax);
 // into it. Else a new one takes its place, which only happens to DNs.
 //
 //   value     not null; null bytes are the empty text.
-//   embedded  not 0: the buffer is part of another block, so it isn't released when it is replaced.
+//   embedded  not 0: the buffer is part of another block, so it isn't released when it is replaced; the caller compares
+//             bv_val with what it was, and free()s a new one.
 DIRBASE_EXPORT int value_normalize_berval(berval* value, uint32_t syntax, int embedded);
 
 // Prepares a value for the relational store: a copy, normalised where that can be done and as given where not.

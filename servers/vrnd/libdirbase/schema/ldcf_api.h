@@ -2,7 +2,8 @@
 //
 // Look-ups, predicates and lists answer from the active schema. They take no lock: any number of threads may call them
 // while the caller holds the read side of the schema lock (ldcf_api_get_modify_attr_info_lock_g), or while no change
-// can be in progress. The life cycle runs on one thread at start-up. No function raises an exception.
+// can be in progress. Where a record is made for the first time, threads take turns (be_fill_attr_info runs then). The
+// life cycle runs on one thread at start-up. No function raises an exception.
 #pragma once
 
 #include <stdbool.h>
@@ -30,15 +31,16 @@ DIRBASE_C_BEGIN
 // cache. Nobody may hold the lock. Returns 0.
 DIRBASE_EXPORT int ldcf_api_schema_init(void);
 
-// Reads one schema file into the active schema. Returns 0, or 1 when anything is wrong with it: the message log tells
-// (it is no longer quiet about exceptions from here on), and the definitions in front of the fault stay.
+// Reads one schema file into the active schema. Returns 0, or 1 when anything is wrong with it: the message log tells,
+// and the definitions in front of the fault stay.
 DIRBASE_EXPORT int ldcf_api_schema_parse(const char* file);
 
 // Links and checks the active schema. Returns 0, or 1 for a schema that can't be used.
 DIRBASE_EXPORT int ldcf_api_schema_complete(void);
 
-// Works out the names in the store, when the back ends are known, and fills the name cache. Returns 0 or 1. Names that
-// the cache has no memory for are found without it.
+// Works out the names in the store, when the back ends are known, and fills the name cache. Returns 0; or 1 for a name
+// of a table or column that can't be one, without the back end that g_srvType asks for (backend.h), and without memory.
+// Names that the cache has no memory for are found without it.
 DIRBASE_EXPORT int ldcf_api_schema_complete_db_names(void);
 
 // ---- the schemas and their lock -----------------------------------------------------------------------------------
@@ -76,7 +78,8 @@ DIRBASE_EXPORT int add_attr_to_entry(Entry* entry, const char* type, const char*
 // The record of an attribute type by name or OID, with or without "oid." in front, a language tag or ";binary" behind
 // (the latter for types of binary syntax only). Null for a name that the schema lacks, a null or empty name, and a type
 // that can't have a record; and without memory for a record that wasn't made yet, or for the name without what stands
-// behind it. Memory that ran out leaves errno at ENOMEM.
+// behind it. Memory that ran out leaves errno at ENOMEM: a caller who must tell it from an unknown name sets errno to 0
+// first.
 //
 //   base_out  may be null. For a name that the cache doesn't hold it receives the name without its language tags, a
 //             text for the caller to free(), or null when it has none, its tags are too long (240 bytes) or memory ran
@@ -102,8 +105,8 @@ DIRBASE_EXPORT asyntaxinfo* ldcf_api_attr_get_info_based_on_table(const char* ta
 // wasn't made yet.
 DIRBASE_EXPORT objectclassinfo* ldcf_api_objectclass_get_info(const char* name);
 
-// Calls a function with the record of every attribute type, once each. Returns 0, or 80 when a type has no record or
-// the function gives anything but 0.
+// Calls a function with the record of every attribute type, once each. Returns 0, or LDAP_OTHER when a type has no
+// record or the function gives anything but 0.
 DIRBASE_EXPORT int ldcf_api_attrtype_apply(ldcf_attrtype_function function, void* argument);
 
 // Free a record that belongs to no definition; null does nothing. The first also empties the name cache: under the
@@ -176,8 +179,8 @@ DIRBASE_EXPORT int ldcf_api_schema_contains_encrypted_attributes(void);
 DIRBASE_EXPORT const csgl_set<ldcf_attrtype>& ldcf_api_get_must_set_from_objclass(const ldcf_objclass& objclass);
 DIRBASE_EXPORT const csgl_set<ldcf_attrtype>& ldcf_api_get_may_set_from_objclass(const ldcf_objclass& objclass);
 
-// The definition under a name that the schema holds; there is no answer for another name, nor without a proposed
-// schema. It lives as long as the schema holds it.
+// The definition under a name, which lives as long as the schema holds it. The name must be one that the schema has,
+// and there must be a proposed schema: that isn't checked, and anything else is a fault of the program.
 DIRBASE_EXPORT const ldcf_attrtype& ldcf_api_get_attrtype_from_schema_g(const char* name);
 DIRBASE_EXPORT const ldcf_attrtype& ldcf_api_get_attrtype_from_proposed_schema_g(const char* name);
 DIRBASE_EXPORT const ldcf_objclass& ldcf_api_get_objclass_from_schema_g(const char* name);

@@ -212,7 +212,8 @@ struct DIRBASE_EXPORT ldcf_attrtype_ : public csgl_refcounted<ldcf_attrtype_> {
     // Works out table and column, once. Raises exc_invalid_input_t for a hyphen in a DBNAME.
     void complete_db_names();
 
-    // Tells the message log when the matching rules don't suit the syntax or each other; 0 when they do, else 18.
+    // Tells the message log when the matching rules don't suit the syntax or each other; LDAP_SUCCESS when they do,
+    // else LDAP_INAPPROPRIATE_MATCHING.
     int check_match_rules() const;
 
     // Drops a subtype that is being erased.

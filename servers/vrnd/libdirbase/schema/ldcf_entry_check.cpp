@@ -58,7 +58,8 @@ int check_dn_values(const Attribute& attr, std::int64_t& place)
         return LDAP_SUCCESS;
     }
     return ldcf_visit_values(attr.a_vals, [&](const berval& value) {
-        const int result = normalize_result(ldcf_value_text(value).c_str(), LDAP_NO_MEMORY);
+        const ldcf_value_text text(value);
+        const int result = text.is_whole() ? normalize_result(text.c_str(), LDAP_NO_MEMORY) : LDAP_INVALID_DN_SYNTAX;
         place += result == LDAP_SUCCESS ? 1 : 0;
         return result;
     });
@@ -234,8 +235,7 @@ private:
     int take(const berval& value)
     {
         const ldcf_value_text name(value);
-        const bool is_whole = std::strlen(name.c_str()) == value.bv_len;  // no class has a byte 0 in its name
-        const ldcf_class_pointer objclass = is_whole ? ldcf_class_named(schema_, name.c_str()) : nullptr;
+        const ldcf_class_pointer objclass = name.is_whole() ? ldcf_class_named(schema_, name.c_str()) : nullptr;
         if (objclass == nullptr) {
             return log_.violation(kind::class_undefined, name.c_str());
         }

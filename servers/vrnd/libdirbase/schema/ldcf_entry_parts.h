@@ -6,6 +6,7 @@
 #pragma once
 
 #include <algorithm>
+#include <cstring>
 #include <functional>
 
 #include "libraries/libber/ldap_result.h"
@@ -68,10 +69,15 @@ public:
         char* text = long_.empty() ? short_ : long_.data();
         std::copy_n(value.bv_val, length, text);
         text[length] = '\0';
+        is_whole_ = std::strlen(text) == length;
     }
     const char* c_str() const { return long_.empty() ? short_ : long_.data(); }
 
+    // Whether no byte 0 cuts it: names and DNs have none.
+    bool is_whole() const { return is_whole_; }
+
 private:
+    bool is_whole_ = true;
     char short_[128];
     csgl_vector<char> long_;
 };

@@ -34,6 +34,11 @@ ldcf_type_pointer type_of_attribute(const ldcf_schema& schema, const char* name)
     return info != nullptr && info->syntax != SC_BIN ? nullptr : ldcf_type_named(schema, plain.get());
 }
 
+ldcf_class_pointer class_of(const ldcf_schema& schema, const ldcf_value_text& name)
+{
+    return name.is_whole() ? ldcf_class_named(schema, name.c_str()) : nullptr;
+}
+
 // The types of an entry's attributes that have values.
 class present_types {
 public:
@@ -49,9 +54,8 @@ public:
     }
 
     // Whether all are there that a class requires; each that isn't is reported.
-    bool satisfy(const char* objclass, const ldcf_entry_reporter& reporter) const
+    bool satisfy(ldcf_class_pointer found, const char* objclass, const ldcf_entry_reporter& reporter) const
     {
-        const ldcf_class_pointer found = ldcf_class_named(schema_, objclass);
         if (found == nullptr) {
             reporter.report(kind::class_unknown, objclass);
             return false;
@@ -79,7 +83,7 @@ public:
     {
         ldcf_pointers<ldcf_objclass_> declaring;
         ldcf_visit_values(classes, [&](const berval& value) {
-            const ldcf_class_pointer found = ldcf_class_named(schema_, ldcf_value_text(value).c_str());
+            const ldcf_class_pointer found = class_of(schema_, ldcf_value_text(value));
             if (found == nullptr) {
                 open_ended_ = true;
                 return 1;
@@ -131,7 +135,8 @@ bool has_required(const ldcf_schema& schema, const Entry& entry, bool is_alias, 
     bool satisfied = true;
     ldcf_visit_values(entry.e_objectclass_attr->a_vals, [&](const berval& value) {
         if (!is_alias || ldcf_names_alias(value)) {
-            satisfied = present.satisfy(ldcf_value_text(value).c_str(), reporter) && satisfied;
+            const ldcf_value_text name(value);
+            satisfied = present.satisfy(class_of(schema, name), name.c_str(), reporter) && satisfied;
         }
         return 0;
     });
@@ -155,7 +160,8 @@ int check_values(const Attribute& attr, const ldcf_entry_reporter& reporter)
     if (syntax == (SC_DN | SC_CIS)) {
         std::int64_t place = 0;
         return ldcf_visit_values(attr.a_vals, [&](const berval& value) {
-            const int result = dn_check(ldcf_value_text(value).c_str(), nullptr);
+            const ldcf_value_text text(value);
+            const int result = text.is_whole() ? dn_check(text.c_str(), nullptr) : LDAP_INVALID_DN_SYNTAX;
             if (result != LDAP_SUCCESS) {
                 reporter.report(kind::value_dn_invalid, attr.a_type, place);
             }
@@ -203,9 +209,10 @@ try {
 
 int oc_check_required(const Entry* entry, const char* objclass)
 try {
-    const bool satisfied =
-        entry != nullptr && objclass != nullptr &&
-        present_types(*ldcf_schema_g, *entry).satisfy(objclass, ldcf_entry_reporter(entry->e_dn, ldcf_entry_log()));
+    const bool satisfied = entry != nullptr && objclass != nullptr &&
+                           present_types(*ldcf_schema_g, *entry)
+                               .satisfy(ldcf_class_named(*ldcf_schema_g, objclass), objclass,
+                                        ldcf_entry_reporter(entry->e_dn, ldcf_entry_log()));
     return satisfied ? 0 : 1;
 } catch (const exc_not_enough_memory_t&) {
     return 1;

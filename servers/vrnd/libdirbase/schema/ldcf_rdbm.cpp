@@ -86,8 +86,10 @@ csgl_string ldcf_rdbm::normalize_column_name(const csgl_string& name)
 
 csgl_string ldcf_rdbm::normalize_table_name(const csgl_string& name, int access_class, int have_db_names)
 {
-    Backend* be = ldcf_api_get_backend(g_backends, g_srvType == server_with_relational_store ? "rdbm" : "proxy");
+    const char* const type = g_srvType == server_with_relational_store ? "rdbm" : "proxy";
+    Backend* be = ldcf_api_get_backend(g_backends, type);
     if (be == nullptr) {
+        debug_error("Error - normalize_table_name: there is no back end of type %s\n", type);
         throw exc_assertion_failed_t(__FILE__, __LINE__, "unexpected null pointer", 0);
     }
     const char* qualifier = be->be_table_qualifier == nullptr ? nullptr : be->be_table_qualifier(be);

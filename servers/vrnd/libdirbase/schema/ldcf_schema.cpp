@@ -2,6 +2,8 @@
 // to disk is ldcf_schema_flush.cpp, the required definitions stand in ldcf_schema_check.cpp.
 #include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
 
+#include <cstring>
+
 #include "servers/vrnd/libcsgl/csgl_file.h"
 
 const char* const LDCF = "ldcf";
@@ -76,7 +78,9 @@ void ldcf_schema::parse(const char* file)
     csgl_file source(file, csgl_file_open_existing, csgl_file_read, csgl_file_deny_none);
     const unsigned size = source.size();
     csgl_local_array_of<char> text(std::size_t{size} + 1);
-    if (source.read(text.get(), size) < size) {
+    char more = 0;  // of a file that grew, or whose size doesn't fit
+    if (source.read(text.get(), size) < size || std::memchr(text.get(), '\0', size) != nullptr ||
+        source.read(&more, sizeof more) != 0) {
         throw exc_end_of_input_t(__FILE__, __LINE__, "exc_end_of_input", 0);
     }
     text[size] = '\0';

@@ -37,8 +37,10 @@ struct DIRBASE_EXPORT ldcf_schema {
     ldcf_schema(const ldcf_schema&) = delete;
     ldcf_schema& operator=(const ldcf_schema&) = delete;
 
-    // Reads a whole schema file, which becomes current_file. A failure inside its text leaves the definitions read so
-    // far, and `files` and current_file as they were; a file that is shorter than it claimed is exc_end_of_input_t.
+    // Reads a whole schema file, of less than 2 GB, which becomes current_file. A failure inside its text leaves the
+    // definitions read so far, and `files` and current_file as they were. A file that can't be read whole is
+    // exc_end_of_input_t and adds nothing: it is shorter or longer than it claimed, or holds a byte 0, which would end
+    // its text.
     void parse(const char* file);
 
     // Reads schema text, zero-terminated. `file` names it in messages and becomes the home of the definitions.
@@ -63,22 +65,23 @@ struct DIRBASE_EXPORT ldcf_schema {
     ldcf_schema& copy(const ldcf_schema& from);
 
     // Take a definition in: it is homed in current_file and linked. An oid or name that exists is exc_ldap_rc_t with
-    // 20. No other schema may hold it any longer: that one unlinks it when it is cleared or goes.
+    // LDAP_TYPE_OR_VALUE_EXISTS. No other schema may hold it any longer: that one unlinks it when it is cleared or
+    // goes.
     void insert(ldcf_syntax& definition);
     void insert(ldcf_matchrule& definition);
     void insert(ldcf_attrtype& definition);
     void insert(ldcf_objclass& definition);
 
     // Take the definition out that has the oid of the given one, or that name in its place; it may be any parsed one.
-    // An oid or name that doesn't exist is exc_ldap_rc_t with 16, names of another definition are exc_invalid_input_t,
-    // and a definition that others use is exc_invalid_state_t.
+    // An oid or name that doesn't exist is exc_ldap_rc_t with LDAP_NO_SUCH_ATTRIBUTE, names of another definition are
+    // exc_invalid_input_t, and a definition that others use is exc_invalid_state_t.
     void erase(ldcf_syntax& definition);
     void erase(ldcf_matchrule& definition);
     void erase(ldcf_attrtype& definition);
     void erase(ldcf_objclass& definition);
 
     // Let the definition with this oid say what the given one says, in its place and its home files. An oid that
-    // doesn't exist is exc_ldap_rc_t with 16, a name of another definition exc_invalid_input_t.
+    // doesn't exist is exc_ldap_rc_t with LDAP_NO_SUCH_ATTRIBUTE, a name of another definition exc_invalid_input_t.
     void replace(ldcf_syntax& definition);
     void replace(ldcf_matchrule& definition);
     void replace(ldcf_attrtype& definition);

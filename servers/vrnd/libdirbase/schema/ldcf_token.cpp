@@ -2,25 +2,20 @@
 #include "servers/vrnd/libdirbase/schema/ldcf_token.h"
 
 #include <array>
-#include <cstdlib>
 #include <cstring>
-#include <memory>
 
-#include "libraries/libber/ldap_env.h"
 #include "libraries/libmsg/debug_log.h"
+#include "servers/vrnd/libdirbase/base/environment.h"
+#include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_common.h"
 
 namespace {
-
-struct free_text {
-    void operator()(char* text) const { std::free(text); }
-};
 
 // Some directories hold attribute names with dots; the server has to be told so.
 bool allow_dots_in_attrname()
 {
     static const bool allowed = [] {
-        const std::unique_ptr<char, free_text> value(ldap_getenv("VRN_ATTRNAME_CONTAINS_DOTS"));
+        const heap_text value = environment_value("VRN_ATTRNAME_CONTAINS_DOTS");
         if (value == nullptr || std::strcmp(value.get(), "YES") != 0) {
             return false;
         }

@@ -130,6 +130,9 @@ TEST_F(GetFilter, TakesNoBytesFromBeyondAConstruction)
     for (const auto& test : cases) {
         EXPECT_EQ(told(read_filter(test.bytes)), test.told) << test.what;
     }
+    for (const unsigned tag : {0x85u, 0xa0u, 0x31u, 0x80u}) {  // in the place of the SEQUENCE
+        EXPECT_EQ(told(read_filter(ber_value(0xa4, cn + ber_value(tag, ber_value(0x80, "a"))))), "2") << tag;
+    }
     const std::string whole =
         ber_value(0xa0, equality + pieces(ber_value(0x80, "a")) + ber_value(0xa2, ber_value(0x87, "sn")));
     const filter_answer answer = read_filter(whole + "more");

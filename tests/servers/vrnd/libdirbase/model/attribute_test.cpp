@@ -256,6 +256,7 @@ TEST_F(DnExpand, TheFirstRdnBecomesAttributes)
         {"cn=\"a,b+c\";sn=x", 0, "cn=a,b+c;", 0, "cn=a,b+c;"},
         {"2.5.4.3=a+cn=A+cn=b", 0, "cn=a|b;", 0, "cn=a|b;"},
         {"cn=a\\2Bb", 0, "cn=a2Bb;", 0, "cn=a+b;"},
+        {"cn=+sn=b,sn=x", 0, "cn=;", 0, "cn=;sn=b;"},
         {"", -1, "", -1, ""},
         {"cn=a+none=b,sn=x", 80, "cn=a;", 80, ""},
         {"cn=a,none=b", 0, "cn=a;", 80, ""},

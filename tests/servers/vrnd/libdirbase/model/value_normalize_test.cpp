@@ -98,6 +98,22 @@ TEST_F(ValueNormalize, EveryRuleInEveryForm)
     }
 }
 
+TEST_F(ValueNormalize, BytesBehindAByte0AreOfNoForm)
+{
+    for (const auto& [syntax, text, result] : {std::tuple(unsigned{DN}, "cn=a", 34),
+                                               {BITS, "'1'B", 21},
+                                               {DIGITS, "12", 21},
+                                               {COUNTRY, "us", 21},
+                                               {TEL, "A1", 0},
+                                               {SC_CIS, "A", 0}}) {
+        std::string bytes = text + std::string("\0b", 2);
+        berval value = {bytes.size(), bytes.data()};
+        EXPECT_EQ(value_normalize_berval(&value, syntax, 1), result) << text;
+        EXPECT_STREQ(value.bv_val, text);
+        EXPECT_EQ(value.bv_len, result == 0 ? std::strlen(text) : bytes.size());
+    }
+}
+
 TEST_F(ValueCompare, TextsNumbersAndBytesByTheirSyntax)
 {
     constexpr int below = -1;

@@ -134,6 +134,8 @@ TEST(LdcfEntryCheck, DnsAreNormalisedUnlessTheNormalFormIsThere)
         entry.e_norm_dn = norm_dn;
         EXPECT_EQ(ldcf_api_schema_check(&entry, nullptr, false), 0) << dn;
     }
+    text_entry with_byte_0(PERSON "|owner: cn=a" + std::string("\0b", 2));
+    EXPECT_EQ(ldcf_api_schema_check(&with_byte_0, nullptr, false), 34);
     text_entry owned(PERSON "|owner: cn=a|owner: a");
     EXPECT_EQ(check_dn_in_attr(ldcf_schema_g, owned.find("owner")), 34);
     EXPECT_EQ(check_dn_in_attr(ldcf_schema_g, owned.find("cn")), 0);

@@ -95,7 +95,7 @@ TEST(LdcfHash, TheDumpShowsEverySlotWithItsChain)
     }
     ldcf_debug_hash_tbl(dir.path("none/dump").c_str());  // can't be opened
     ldcf_debug_hash_tbl(dir.path("dump").c_str());
-    const std::string dump = schema_test::read_text(dir.path("dump"));
+    const std::string dump = test_support::file_text(dir.path("dump"));
     EXPECT_TRUE(dump.starts_with("\tDump of Schema Hash Cache\nhashTable[ 0 ] = NULL\nhashTable[ 1 ] = NULL\n"));
     EXPECT_NE(dump.find("hashTable[ " + std::to_string(slow_slot("CN")) + " ] = ( CN ) ->( CN ) ->NULL\n"), dump.npos);
     EXPECT_TRUE(dump.ends_with("hashTable[ 7000 ] = NULL\n\nHash table size:\t\t7001\nHash table positions used:\t2\n"

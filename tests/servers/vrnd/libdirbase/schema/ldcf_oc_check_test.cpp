@@ -44,6 +44,11 @@ TEST_F(LdcfOcCheck, EachFaultHasItsResultAndItsMessages)
         EXPECT_EQ(ldcf_oc_schema_check(&entry), c.result);
         EXPECT_EQ(entry_test::told(debug, messages), c.messages);
     }
+    const std::string junk("\0x", 2);  // behind a byte 0, which no name and no DN has
+    const text_entry unknown("dn: cn=x|cn: x|sn: y|objectClass: person" + junk);
+    EXPECT_EQ(ldcf_oc_schema_check(&unknown), 65);
+    const text_entry no_dn("dn: cn=x|objectClass: person|cn: x|sn: y|owner: cn=a" + junk);
+    EXPECT_EQ(ldcf_oc_schema_check(&no_dn), 34);
     EXPECT_EQ(ldcf_oc_schema_check(nullptr), 0);
 }
 

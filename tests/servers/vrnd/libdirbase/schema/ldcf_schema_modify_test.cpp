@@ -224,7 +224,7 @@ TEST_F(SchemaModify, OtherFilesInTheFolderAreNoneOfItsBusiness)
 {
     const std::string old = dir_.write("zadditions.old", "a copy that the administrator keeps");
     change(add, parsed<ldcf_syntax>("( 5.5 )"));
-    EXPECT_TRUE(fs::exists(old) && schema_test::read_text(old) == "a copy that the administrator keeps");
+    EXPECT_TRUE(fs::exists(old) && test_support::file_text(old) == "a copy that the administrator keeps");
 }
 
 TEST_F(SchemaModify, AChangeOfProtectionIsToldAfterTheCommit)

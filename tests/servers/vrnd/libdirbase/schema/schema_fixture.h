@@ -8,8 +8,6 @@
 #include <algorithm>
 #include <cstdlib>
 #include <filesystem>
-#include <fstream>
-#include <iterator>
 #include <sstream>
 #include <string>
 #include <string_view>
@@ -19,6 +17,7 @@
 #include "servers/vrnd/libdirbase/base/backend.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
 #include "tests/support/message_catcher.h"
+#include "tests/support/temp_dir.h"
 
 namespace schema_test {
 
@@ -101,18 +100,11 @@ std::string read_all(const char* text)
     return result + fault;
 }
 
-inline std::string read_text(const std::string& path)
-{
-    std::ifstream in(path, std::ios::binary);
-    EXPECT_TRUE(in) << path;
-    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
-}
-
 // The shipped schema files in the order of the list, with full paths.
 inline std::vector<std::string> shipped_files()
 {
     std::vector<std::string> files;
-    std::istringstream list(read_text(DIRBASE_SOURCE_SCHEMA_DIR "/schema.list"));
+    std::istringstream list(test_support::file_text(DIRBASE_SOURCE_SCHEMA_DIR "/schema.list"));
     for (std::string line; std::getline(list, line);) {
         if (!line.empty() && line[0] != '#') {
             files.push_back(DIRBASE_SOURCE_SCHEMA_DIR "/" + line);
@@ -134,7 +126,7 @@ inline const std::string& required_text()
     static const std::string text = [] {
         std::string all;
         for (const std::string& file : shipped_files()) {
-            all += file.ends_with(".sx") || file.ends_with(".mr") ? read_text(file) : "";
+            all += file.ends_with(".sx") || file.ends_with(".mr") ? test_support::file_text(file) : "";
         }
         return all;
     }();
@@ -245,7 +237,7 @@ inline std::string content_of(const std::string& folder)
     std::vector<std::string> entries;
     for (const auto& entry : std::filesystem::directory_iterator(folder)) {
         entries.push_back(entry.path().filename().string() + ":\n" +
-                          (entry.is_directory() ? "a folder\n" : read_text(entry.path().string())));
+                          (entry.is_directory() ? "a folder\n" : test_support::file_text(entry.path())));
     }
     std::sort(entries.begin(), entries.end());
     std::string all;
