@@ -7,10 +7,45 @@ namespace {
 
 // Help is wrapped by hand, since the parser's library doesn't wrap.
 constexpr char exit_statuses[] = R"(
-Exit status: 0 for yes, 1 for findings (the message says what, and where), 2 for a wrong call or input that
-can't be read.)";
+Exit status: 0 for yes, 1 for findings (the message says what, and where), 2 for a wrong call, input
+that can't be read, or a failure of the operating system. With --json "ok" is true for 0 alone.)";
+
+// Stands behind a shielded argument: no argument holds it.
+constexpr char shield = '\0';
 
 }  // namespace
+
+std::vector<std::string> shielded(int argc, char** argv)
+{
+    std::vector<std::string> arguments;
+    for (int i = argc - 1; i > 0; --i) {
+        std::string& argument = arguments.emplace_back(argv[i]);
+        const bool is_list = argument.starts_with('[') && argument.ends_with(']');
+        const bool lacks_value = argument.starts_with("--") && argument.find('=') == argument.size() - 1;
+        argument += is_list || lacks_value || argument == "++" ? std::string(1, shield) : "";
+    }
+    return arguments;
+}
+
+void unshield(CLI::App& app)
+{
+    for (CLI::Option* option : app.get_options()) {
+        if (option->get_items_expected_max() > 0) {  // not a flag
+            option->transform([](std::string text) {
+                text.resize(text.size() - (text.ends_with(shield) ? 1 : 0));
+                return text;
+            });
+        }
+    }
+    for (CLI::App* below : app.get_subcommands([](CLI::App*) { return true; })) {
+        unshield(*below);
+    }
+}
+
+CLI::Validator not_empty()
+{
+    return CLI::Validator([](const std::string& name) { return name.empty() ? "the name is empty" : ""; }, "");
+}
 
 void add_flags_of_all(CLI::App& app)
 {
@@ -43,6 +78,7 @@ CLI::App* add_command(CLI::App& group, const std::string& name, const std::strin
     app->add_option("--schema", common.schema_folder,
                     "Directory of schema.list and the files that it names (default: that of\n"
                     "the environment variable DIRBASE_SCHEMA, else the one that came along)")
+        ->check(not_empty())
         ->type_name("DIR");
     return app;
 }

@@ -44,6 +44,19 @@ Value value_of(const std::string& text, const word<Value> (&words)[count], Value
     return otherwise;
 }
 
+// ---- arguments as they are written ----------------------------------------------------------------------------------
+//
+// The parser gives some arguments a meaning of their own: it takes "[a,b]" apart as a list, ends a command at "++", and
+// an option "--name=" takes the next argument for its value. shielded() hides those from it, and the options that
+// unshield() was called for hand over what was written. Called for a group, that holds for all below it.
+
+// The arguments behind the name of the program, for CLI::App::parse: the last one first.
+std::vector<std::string> shielded(int argc, char** argv);
+void unshield(CLI::App& app);
+
+// Accepts any name of a file or folder but the empty one, which a variable that isn't set leaves.
+CLI::Validator not_empty();
+
 // ---- setting up -----------------------------------------------------------------------------------------------------
 
 // --version and --help.

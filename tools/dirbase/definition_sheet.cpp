@@ -13,17 +13,17 @@ constexpr std::size_t label_width = 22;
 definition_sheet::definition_sheet(const std::string& kind, const std::string& name) : title_(kind + " " + name)
 {
     members_["kind"] = kind;
-    members_["name"] = name;
+    members_["name"] = json_of_value(name);
 }
 
 void definition_sheet::add(const std::string& label, const std::string& key, const std::string& value)
 {
-    add(label, value.empty() ? nothing : value, key, value.empty() ? json() : json(value));
+    add(label, value.empty() ? nothing : value, key, value.empty() ? json() : json_of_value(value));
 }
 
 void definition_sheet::add(const std::string& label, const std::string& key, const std::vector<std::string>& values)
 {
-    add(label, joined(values), key, values);
+    add(label, joined(values), key, json_of_values(values));
 }
 
 void definition_sheet::add(const std::string& label, const std::string& key, bool value)

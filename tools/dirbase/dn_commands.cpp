@@ -6,9 +6,9 @@
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/model/dn_check.h"
 #include "servers/vrnd/libdirbase/model/dn_esc.h"
+#include "tools/dirbase/answers.h"
 #include "tools/dirbase/data_commands.h"
 #include "tools/dirbase/schema_directory.h"
-#include "tools/dirbase/text_file.h"
 
 namespace dirbase_tool {
 
@@ -46,31 +46,6 @@ constexpr fault_words faults[] = {
     {DN_ERR_TOO_LONG, "longer than 2000 bytes"},
 };
 
-// Why a DN is refused: the result, what is wrong, and the offset of the byte where it is, if there is one place.
-struct verdict {
-    int result = LDAP_SUCCESS;
-    std::string words;
-    std::ptrdiff_t offset = -1;
-
-    std::string text() const
-    {
-        std::string line = result_words(result);
-        line += offset < 0 ? "" : " at byte " + std::to_string(offset);
-        return line + (words.empty() ? "" : ": " + words);
-    }
-    json as_json() const
-    {
-        json member = {{"result", result}, {"name", result_words(result)}};
-        if (offset >= 0) {
-            member["offset"] = offset;
-        }
-        if (!words.empty()) {
-            member["reason"] = words;
-        }
-        return member;
-    }
-};
-
 // Parses once more, RDN by RDN, up to the fault.
 std::ptrdiff_t offset_of_fault(const std::string& dn, bool light)
 {
@@ -95,9 +70,9 @@ dn_pointer normalized(const std::string& dn, bool light)
     return not_null(light ? dn_normalize_light_esc(dn.c_str()) : dn_normalize_esc(dn.c_str()));
 }
 
-verdict verdict_on(const std::string& dn, const ldap_escDN& parsed, bool light)
+refusal_words verdict_on(const std::string& dn, const ldap_escDN& parsed, bool light)
 {
-    verdict found;
+    refusal_words found;
     found.result = parsed.result;
     for (const fault_words& known : faults) {
         found.words = known.error == parsed.internal_error ? known.words : found.words;
@@ -107,16 +82,10 @@ verdict verdict_on(const std::string& dn, const ldap_escDN& parsed, bool light)
     return found;
 }
 
-// One answer, as lines and as JSON.
-struct answer {
-    bool refused = false;
-    std::string text;
-    json member;
-};
-
-answer refusal(const std::string& dn, const verdict& why)
+answer refusal(const std::string& dn, const refusal_words& why)
 {
-    return {true, "refused    " + why.text() + "\n", {{"dn", dn}, {"ok", false}, {"error", why.as_json()}}};
+    return {
+        false, "refused    " + why.text() + "\n", {{"dn", json_of_value(dn)}, {"ok", false}, {"error", why.as_json()}}};
 }
 
 answer normalize(const std::string& dn, bool light)
@@ -127,21 +96,24 @@ answer normalize(const std::string& dn, bool light)
     }
     const std::string canonical = GetDNString33(parsed.get());
     const std::string upper = GetDNUpper33(parsed.get());
-    return {false,
-            "canonical  " + canonical + "\nupper      " + upper + "\n",
-            {{"dn", dn}, {"ok", true}, {"canonical", canonical}, {"upper", upper}}};
+    return {true,
+            "canonical  " + shown(canonical) + "\nupper      " + shown(upper) + "\n",
+            {{"dn", json_of_value(dn)},
+             {"ok", true},
+             {"canonical", json_of_value(canonical)},
+             {"upper", json_of_value(upper)}}};
 }
 
 answer check(const std::string& dn)
 {
     std::size_t offset = 0;
-    verdict found;
+    refusal_words found;
     found.result = dn_check(dn.c_str(), &offset);
     if (found.result != LDAP_SUCCESS) {
         found.offset = static_cast<std::ptrdiff_t>(offset);
         return refusal(dn, found);
     }
-    return {false, "ok\n", {{"dn", dn}, {"ok", true}}};
+    return {true, "ok\n", {{"dn", json_of_value(dn)}, {"ok", true}}};
 }
 
 answer parent(const std::string& dn, bool light)
@@ -151,11 +123,11 @@ answer parent(const std::string& dn, bool light)
         return refusal(dn, verdict_on(dn, *parsed, light));
     }
     if (parsed->count < 2) {
-        return {false, "none\n", {{"dn", dn}, {"ok", true}, {"parent", nullptr}}};
+        return {true, "none\n", {{"dn", json_of_value(dn)}, {"ok", true}, {"parent", nullptr}}};
     }
     const dn_pointer above = not_null(ParentDN33(parsed.get()));
     const std::string text = GetDNString33(above.get());
-    return {false, text + "\n", {{"dn", dn}, {"ok", true}, {"parent", text}}};
+    return {true, shown(text) + "\n", {{"dn", json_of_value(dn)}, {"ok", true}, {"parent", json_of_value(text)}}};
 }
 
 // The schema that names are looked up in, unless it isn't wanted.
@@ -168,71 +140,85 @@ void load_schema(const common_options& common, bool light)
 
 }  // namespace
 
-std::string result_words(int result)
+std::string result_name(int result)
 {
     switch (result) {
-    case LDAP_SUCCESS: return "0 success";
-    case LDAP_OPERATIONS_ERROR: return "1 operationsError";
-    case LDAP_PROTOCOL_ERROR: return "2 protocolError";
-    case LDAP_CONFIDENTIALITY_REQUIRED: return "13 confidentialityRequired";
-    case LDAP_UNDEFINED_TYPE: return "17 undefinedAttributeType";
-    case LDAP_INVALID_SYNTAX: return "21 invalidAttributeSyntax";
-    case LDAP_INVALID_DN_SYNTAX: return "34 invalidDNSyntax";
-    case LDAP_UNWILLING_TO_PERFORM: return "53 unwillingToPerform";
-    case LDAP_OBJECT_CLASS_VIOLATION: return "65 objectClassViolation";
-    case LDAP_OTHER: return "80 other";
-    case LDAP_NO_MEMORY: return "90 no memory";
-    default: return std::to_string(result);
+    case LDAP_SUCCESS: return "success";
+    case LDAP_OPERATIONS_ERROR: return "operationsError";
+    case LDAP_PROTOCOL_ERROR: return "protocolError";
+    case LDAP_CONFIDENTIALITY_REQUIRED: return "confidentialityRequired";
+    case LDAP_UNDEFINED_TYPE: return "undefinedAttributeType";
+    case LDAP_INVALID_SYNTAX: return "invalidAttributeSyntax";
+    case LDAP_INVALID_DN_SYNTAX: return "invalidDNSyntax";
+    case LDAP_UNWILLING_TO_PERFORM: return "unwillingToPerform";
+    case LDAP_OBJECT_CLASS_VIOLATION: return "objectClassViolation";
+    case LDAP_OTHER: return "other";
+    case LDAP_NO_MEMORY: return "no memory";
+    default: return "";
     }
+}
+
+std::string result_words(int result)
+{
+    const std::string name = result_name(result);
+    return std::to_string(result) + (name.empty() ? "" : " ") + name;
+}
+
+std::string refusal_words::text() const
+{
+    std::string line = result_words(result);
+    line += offset < 0 ? "" : " at byte " + std::to_string(offset);
+    return line + (words.empty() ? "" : ": " + words);
+}
+
+json refusal_words::as_json() const
+{
+    json member = {{"result", result}, {"name", result_name(result)}};
+    if (offset >= 0) {
+        member["offset"] = offset;
+    }
+    if (!words.empty()) {
+        member["reason"] = words;
+    }
+    return member;
+}
+
+refusal_words why_dn_is_refused(const std::string& dn)
+{
+    return verdict_on(dn, *normalized(dn, false), false);
 }
 
 std::string refusal_of_dn(const std::string& dn)
 {
-    return verdict_on(dn, *normalized(dn, false), false).text();
+    return why_dn_is_refused(dn).text();
 }
 
 int ask_of_dns(const common_options& common, dn_question question, const std::vector<std::string>& dns, bool light)
 {
     load_schema(common, light || question == dn_question::check);
-    bool refused = false;
-    json members = json::array();
-    std::string text;
-    for (const std::string& dn : with_lines_of_input(dns)) {
-        const answer given = question == dn_question::normalize ? normalize(dn, light)
-                             : question == dn_question::parent  ? parent(dn, light)
-                                                                : check(dn);
-        refused = refused || given.refused;
-        if (common.as_json) {
-            members.push_back(given.member);
-        } else {
-            text += given.text;
-        }
-    }
-    if (common.as_json) {
-        write_json(json{{"ok", !refused}, {"dns", std::move(members)}});
-    } else {
-        write_result(text);
-    }
-    return refused ? status_findings : status_yes;
+    return answer_each(common, {.list = "dns"}, dns, [question, light](const std::string& dn) {
+        return question == dn_question::normalize ? normalize(dn, light)
+               : question == dn_question::parent  ? parent(dn, light)
+                                                  : check(dn);
+    });
 }
 
 int compare_dns(const common_options& common, const std::string& first, const std::string& second, bool light)
 {
     load_schema(common, light);
     const answer answers[] = {normalize(first, light), normalize(second, light)};
-    for (const answer& given : answers) {
-        if (given.refused) {
-            if (common.as_json) {
-                write_json(json{{"ok", false}, {"dns", {answers[0].member, answers[1].member}}});
-            } else {
-                write_result(given.text);
-            }
-            return status_findings;
-        }
-    }
-    const bool same = answers[0].member["upper"] == answers[1].member["upper"];
+    const bool refused = !answers[0].is_good || !answers[1].is_good;
+    const bool same = !refused && answers[0].member["upper"] == answers[1].member["upper"];
     if (common.as_json) {
-        write_json(json{{"ok", true}, {"same", same}, {"dns", {answers[0].member, answers[1].member}}});
+        json result = {{"ok", same}};
+        if (!refused) {
+            result["same"] = same;
+        }
+        result["dns"] = {answers[0].member, answers[1].member};
+        write_json(result);
+    } else if (refused) {
+        write_result((answers[0].is_good ? "" : "first DN   " + answers[0].text) +
+                     (answers[1].is_good ? "" : "second DN  " + answers[1].text));
     } else {
         write_result(same ? "same\n" : "different\n");
     }

@@ -60,9 +60,10 @@ constexpr char filter_parse_details[] =
 What is printed is the canonical text, as a server logs it, and the elements below each other, values in normal
 form. An element that is undefined (the schema lacks its attribute, its value is longer than the attribute's
 column, or it is an extensible match) is left out of an OR and makes an AND or a NOT undefined; a search by an
-undefined filter finds nothing. An element that is refused makes the whole filter refused.
+undefined filter finds nothing. An element that is refused makes the whole filter refused. An integer, a boolean
+or a time that is none is remarked on.
 
-A FILTER that is - stands for those on standard input, one a line. Exit status 1 says that one isn't defined.
+A FILTER that is - stands for those on standard input, one a line of at most 1 MiB. Exit status 1 says that one isn't defined.
 
   dirbase filter parse '(&(objectClass=person)(|(cn=a*b)(sn~=smith)))'
 )";
@@ -81,7 +82,7 @@ constexpr word<search_scope> scopes[] = {
 
 void add_file(CLI::App& app, std::string& file)
 {
-    app.add_option("FILE", file, "The LDIF file, - for standard input")->type_name("")->required();
+    app.add_option("FILE", file, "The LDIF file, - for standard input")->check(not_empty())->type_name("")->required();
 }
 
 void add_threads(CLI::App& app, unsigned& threads)
@@ -106,6 +107,7 @@ void add_ldif_check(CLI::App& group, common_options& common, entry_options& give
                   "Permit the attributes of the password policy and those that servers set,\nas in a copy of another "
                   "server");
     app->add_option("--rejects", call.rejects, "Write the refused entries, as they stood, to this file")
+        ->check(not_empty())
         ->type_name("FILE");
     add_threads(*app, call.threads);
     app->callback([&] { chosen = [&](message_collector&) { return check_ldif(common, given.check); }; });
@@ -128,9 +130,13 @@ void add_ldif_diff(CLI::App& group, common_options& common, entry_options& given
     CLI::App* app =
         add_command(group, "diff", "Print the changes that turn one LDIF file into another", ldif_diff_details, common);
     app->add_option("BEFORE", given.before, "The file to compare with, - for standard input")
+        ->check(not_empty())
         ->type_name("")
         ->required();
-    app->add_option("AFTER", given.after, "The file that may differ, - for standard input")->type_name("")->required();
+    app->add_option("AFTER", given.after, "The file that may differ, - for standard input")
+        ->check(not_empty())
+        ->type_name("")
+        ->required();
     app->callback([&] { chosen = [&](message_collector&) { return diff_ldif(common, given.before, given.after); }; });
 }
 

@@ -1,10 +1,10 @@
 // dirbase filter parse
 #include "servers/vrnd/libdirbase/base/server_globals.h"
+#include "tools/dirbase/answers.h"
 #include "tools/dirbase/filter_commands.h"
 #include "tools/dirbase/filter_text.h"
 #include "tools/dirbase/ldif_entry.h"
 #include "tools/dirbase/schema_directory.h"
-#include "tools/dirbase/text_file.h"
 
 namespace dirbase_tool {
 
@@ -27,7 +27,7 @@ void draw(const filter_element& element, std::size_t indent, std::string& text)
     text += std::string(indent, ' ');
     const bool is_list = filter_has_list(element.choice) && element.reason.empty();
     if (element.verdict == filter_verdict::defined || is_list) {
-        text += element.label() + "\n";
+        text += element.label() + (element.remark.empty() ? "" : " (" + element.remark + ")") + "\n";
     } else {
         text +=
             std::string(word_of(element.verdict)) + ": " + element.label() + " (" + on_one_line(element.reason) + ")\n";
@@ -41,7 +41,7 @@ std::string text_of(const parsed_filter& filter)
 {
     std::string text;
     switch (filter.verdict()) {
-    case filter_verdict::defined: text = filter.canonical() + "\n"; break;
+    case filter_verdict::defined: text = shown(filter.canonical()) + "\n"; break;
     case filter_verdict::undefined: text = "undefined  no entry matches it\n"; break;
     case filter_verdict::refused: text = "refused    " + on_one_line(filter.fault()) + "\n"; break;
     case filter_verdict::no_filter:
@@ -75,25 +75,13 @@ int parse_filters(const common_options& common, const std::vector<std::string>& 
 {
     set_g_language_tags_enabled(1);
     load_for_names(common.schema_folder);
-    bool all_defined = true;
-    json members = json::array();
-    std::string text;
     const schema_reader guard;
-    for (const std::string& given : with_lines_of_input(filters)) {
-        const parsed_filter filter(given);
-        all_defined = all_defined && filter.verdict() == filter_verdict::defined;
-        if (common.as_json) {
-            members.push_back(json_of(given, filter));
-        } else {
-            text += (text.empty() ? "" : "\n") + text_of(filter);
-        }
-    }
-    if (common.as_json) {
-        write_json(json{{"ok", all_defined}, {"filters", std::move(members)}});
-    } else {
-        write_result(text);
-    }
-    return all_defined ? status_yes : status_findings;
+    return answer_each(common, {.list = "filters", .separator = "\n"}, filters,
+                       [as_json = common.as_json](const std::string& given) {
+                           const parsed_filter filter(given);
+                           return answer{filter.verdict() == filter_verdict::defined, as_json ? "" : text_of(filter),
+                                         as_json ? json_of(given, filter) : json()};
+                       });
 }
 
 }  // namespace dirbase_tool

@@ -11,8 +11,10 @@
 #include "libraries/libber/ldap_error.h"
 #include "libraries/libber/ldap_result.h"
 #include "servers/vrnd/libdirbase/base/heap.h"
+#include "servers/vrnd/libdirbase/base/syntax_codes.h"
 #include "servers/vrnd/libdirbase/connection/filter_ber.h"
 #include "servers/vrnd/libdirbase/model/attr_names.h"
+#include "servers/vrnd/libdirbase/model/syntax_value.h"
 #include "servers/vrnd/str2filter.h"
 #include "tools/dirbase/data_commands.h"
 #include "tools/dirbase/ldif_faults.h"
@@ -343,6 +345,26 @@ std::string cause_of_refusal(const filter_element& element)
     return has_zero ? ", for the value holds a byte 0" : "";
 }
 
+// A server takes integers, booleans and times that are none, and compares them as well as it can.
+std::string remark_on(const filter_element& element)
+{
+    if (element.choice != LDAP_FILTER_EQUALITY && element.choice != LDAP_FILTER_GE &&
+        element.choice != LDAP_FILTER_LE) {
+        return "";
+    }
+    asyntaxinfo* info = nullptr;
+    const std::uint32_t syntax = attr_syntax_for_filter_return_asi(element.type.c_str(), &info);
+    const bool is_compared =
+        (syntax & (SC_INT | SC_GT | SC_UTCT)) != 0 || (syntax == SC_BOOL && element.choice == LDAP_FILTER_EQUALITY);
+    if (!is_compared || check_syntax(syntax, element.value.c_str()) == 0) {
+        return "";
+    }
+    const char* const effect = syntax == SC_INT    ? "it counts as the number that it begins with, or 0"
+                               : syntax == SC_BOOL ? "no proper value equals it"
+                                                   : "every proper time counts as the greater one";
+    return std::string("the value ") + fault_of_syntax(syntax) + "; " + effect;
+}
+
 // Describes a filter without elements and gives its encoding.
 std::string take_item(const Filter& raw, filter_element& element)
 {
@@ -370,6 +392,7 @@ std::string take_item(const Filter& raw, filter_element& element)
         element.reason = read.refusal() + cause_of_refusal(element);
     } else if (read.filter != nullptr) {
         describe(element, *read.filter);
+        element.remark = remark_on(element);
     } else {
         element.reason = reason_of_undefined(element);
     }
@@ -411,15 +434,18 @@ std::string printable(const std::string& text)
     return result;
 }
 
-void collect_remarks(const filter_element& element, std::vector<std::string>& remarks)
+void collect_remarks(const filter_element& element, bool only_undefined, std::vector<std::string>& remarks)
 {
     if (!element.reason.empty()) {
         remarks.push_back(element.label() +
                           (element.verdict == filter_verdict::refused ? " is refused: " : " is undefined: ") +
                           element.reason);
     }
+    if (!element.remark.empty() && !only_undefined) {
+        remarks.push_back(element.label() + ": " + element.remark);
+    }
     for (const filter_element& child : element.elements) {
-        collect_remarks(child, remarks);
+        collect_remarks(child, only_undefined, remarks);
     }
 }
 
@@ -451,7 +477,7 @@ json filter_element::as_json() const
             member["elements"].push_back(element.as_json());
         }
     } else {
-        member["attribute"] = type;
+        member["attribute"] = json_of_value(type);
         if (choice == LDAP_FILTER_SUBSTRINGS) {
             member["pieces"] = json::array();
             for (const auto& [name, piece] : pieces) {
@@ -464,6 +490,9 @@ json filter_element::as_json() const
     }
     if (!reason.empty()) {
         member[verdict == filter_verdict::refused ? "refused" : "undefined"] = reason;
+    }
+    if (!remark.empty()) {
+        member["remark"] = remark;
     }
     return member;
 }
@@ -490,10 +519,10 @@ parsed_filter::parsed_filter(const std::string& text)
     fault_ = whole.result == LDAP_SUCCESS ? "" : whole.refusal();
 }
 
-std::vector<std::string> parsed_filter::remarks() const
+std::vector<std::string> parsed_filter::remarks(bool only_undefined) const
 {
     std::vector<std::string> remarks;
-    collect_remarks(root_, remarks);
+    collect_remarks(root_, only_undefined, remarks);
     return remarks;
 }
 

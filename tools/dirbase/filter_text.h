@@ -31,6 +31,7 @@ struct filter_element {
     filter_verdict verdict = filter_verdict::defined;
     int result = 0;      // of one that is refused: an LDAP result
     std::string reason;  // why it isn't defined; empty for a list, unless that is empty
+    std::string remark;  // of one that is defined: that its value isn't of its syntax, and what comes of that
     std::string type;
     std::string value;
     std::vector<std::pair<const char*, std::string>> pieces;  // of a substring filter: "initial", "any", "final"
@@ -63,8 +64,9 @@ public:
     // All elements as written; without a meaning when the text isn't a filter.
     const filter_element& root() const { return root_; }
 
-    // "equality foo = x is undefined: REASON", for each element that isn't defined.
-    std::vector<std::string> remarks() const;
+    // "equality foo = x is undefined: REASON", for each element that isn't defined, and "equality foo = x: REMARK" for
+    // each that has one, unless only what is undefined or refused is wanted.
+    std::vector<std::string> remarks(bool only_undefined = false) const;
 
 private:
     filter_verdict verdict_ = filter_verdict::no_filter;

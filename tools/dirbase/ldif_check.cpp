@@ -2,11 +2,11 @@
 //
 // One thread reads batches of whole entries and prints what was found, in the order of the file; others check the
 // batches (ldif_pool.h).
-#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <vector>
 
+#include "tools/dirbase/current_failure.h"
 #include "tools/dirbase/ldif_commands.h"
 #include "tools/dirbase/ldif_pool.h"
 #include "tools/dirbase/ldif_reader.h"
@@ -63,7 +63,7 @@ public:
     void operator()(work& item);
 
 private:
-    void check_one(work& item, std::string_view entry, std::size_t line, std::uint64_t size);
+    void check_one(work& item, const ldif_entry_text& entry);
     void tell(work& item, std::string_view entry, bool as_it_stood);
 
     const check_settings& settings_;
@@ -77,42 +77,26 @@ void batch_checker::operator()(work& item)
     item.rejects.clear();
     item.found = {};
     const schema_reader guard;
-    std::string_view rest = item.batch.text;
-    std::size_t line = item.batch.first_line;
-    if (item.batch.too_large != 0) {
-        check_one(item, rest, line, item.batch.too_large);
-        return;
-    }
-    while (!rest.empty()) {
-        const std::string_view entry = take_entry(rest);
-        check_one(item, entry, line, entry.size());
-        line += static_cast<std::size_t>(std::count(entry.begin(), entry.end(), '\n'));
+    ldif_entry_text entry;
+    while (item.told.size() + item.rejects.size() < results_limit && take_entry(item.batch, entry)) {
+        check_one(item, entry);
     }
 }
 
-// Checks an entry of `size` bytes, of which `entry` holds the first when there are too many.
-void batch_checker::check_one(work& item, std::string_view entry, std::size_t line, std::uint64_t size)
+void batch_checker::check_one(work& item, const ldif_entry_text& entry)
 {
     faults_.clear();
-    if (size > entry_limit) {
-        text_.parse(entry.substr(0, entry.substr(0, 4096).rfind('\n') + 1), line, faults_);  // for its DN
-        faults_.clear();
-        faults_.add(ldif_fault_kind::too_large, std::max(line, text_.line()), "",
-                    "an entry of " + std::to_string(size) + " bytes, more than " + std::to_string(entry_limit) +
-                        "; it isn't looked at");
-    } else {
-        const ldif_text::content content = text_.parse(entry, line, faults_);
-        if (content == ldif_text::content::nothing) {
-            return;
-        }
-        if (content == ldif_text::content::entry) {
-            check_entry(text_, settings_.checks, faults_);
-        }
+    const ldif_text::content content = text_.parse(entry, faults_);
+    if (content == ldif_text::content::nothing) {
+        return;
+    }
+    if (content == ldif_text::content::entry) {
+        check_entry(text_, settings_.checks, faults_);
     }
     ++item.found.entries;
     if (!faults_.empty()) {
         ++item.found.refused;
-        tell(item, entry, item.batch.aside == nullptr);
+        tell(item, entry.text, item.batch.aside == nullptr);
     }
 }
 
@@ -121,29 +105,23 @@ void batch_checker::check_one(work& item, std::string_view entry, std::size_t li
 //   as_it_stood  false when the rejects take the entry from elsewhere
 void batch_checker::tell(work& item, std::string_view entry, bool as_it_stood)
 {
-    const std::string dn = text_.dn() == nullptr ? "" : std::string(text_.dn()->value, text_.dn()->length);
-    const std::size_t left_out = faults_.left_out();
-    const std::string more = left_out == 0 ? "" : "and " + std::to_string(left_out) + " more faults in this entry";
     bool begins_with_fold = false;
     for (const ldif_fault& fault : faults_.kept()) {
-        const std::string line = line_of(fault, settings_.source, dn);
         begins_with_fold = begins_with_fold || fault.kind == ldif_fault_kind::fold_at_start;
         if (settings_.as_json) {
-            item.told += (item.told.empty() ? "    " : ",\n    ") +
-                         json_of(fault, settings_.source, dn).dump(-1, ' ', false, json::error_handler_t::replace);
-        } else {
-            item.told += line + "\n";
+            item.told +=
+                (item.told.empty() ? "    " : ",\n    ") +
+                json_of(fault, settings_.source, dn_of(text_)).dump(-1, ' ', false, json::error_handler_t::replace);
         }
-        item.rejects += settings_.with_rejects ? "# " + line + "\n" : "";
     }
-    if (!more.empty() && !settings_.as_json) {
-        item.told += settings_.source + ":" + std::to_string(text_.line()) + ": " + more + "\n";
+    for (const std::string& line : lines_of(faults_, text_, settings_.source)) {
+        item.told += settings_.as_json ? "" : line + "\n";
+        item.rejects += settings_.with_rejects ? "# " + line + "\n" : "";
     }
     for (std::size_t i = 0; i < ldif_fault_kinds; ++i) {
         item.found.counts[i] += faults_.counts()[i];
     }
     if (settings_.with_rejects && as_it_stood) {
-        item.rejects += more.empty() ? "" : "# " + more + "\n";
         item.rejects += begins_with_fold ? "\n" : "";  // else the comment would be continued
         item.rejects += without_empty_lines(entry);
         item.rejects += "\n\n";
@@ -216,7 +194,7 @@ public:
 
     void take(const work& item);
     void finish(const tool_failure* failure);
-    bool all_accepted() const { return found_.refused == 0; }
+    int status() const { return found_.refused == 0 ? status_yes : status_findings; }
 
 private:
     std::string summary() const;
@@ -284,7 +262,7 @@ void findings::finish(const tool_failure* failure)
                  {"kinds", std::move(kinds)},
                  {"ok", failure == nullptr && found_.refused == 0}};
     if (failure != nullptr) {
-        rest["error"] = {{"file", failure->file()}, {"text", failure->what()}};
+        rest["error"] = json_of(*failure);
     }
     const std::string text = rest.dump(2, ' ', false, json::error_handler_t::replace);
     write_result((told_ ? "\n  ],\n" : "{\n  \"faults\": [],\n") + text.substr(2) + "\n");
@@ -305,7 +283,7 @@ int check_ldif(const common_options& common, const ldif_check_call& call)
     ldif_reader reader(call.file, settings.with_rejects);
     rejects_file rejects(call.rejects, reader);
     findings out(settings, reader, rejects);
-    try {
+    return write_results(common.as_json, out, [&] {
         for_each_batch<work>(
             reader, ldif_threads(call.threads), [&settings] { return batch_checker(settings); },
             [&out](const work& item) {
@@ -313,16 +291,7 @@ int check_ldif(const common_options& common, const ldif_check_call& call)
                 return true;
             });
         rejects.close();
-    } catch (const tool_failure& failure) {
-        if (!common.as_json) {
-            throw;
-        }
-        tell(failure.message());
-        out.finish(&failure);
-        return failure.status();
-    }
-    out.finish(nullptr);
-    return out.all_accepted() ? status_yes : status_findings;
+    });
 }
 
 }  // namespace dirbase_tool

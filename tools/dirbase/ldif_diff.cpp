@@ -3,7 +3,9 @@
 // Both files are held as entries, found by their normal DN. The changes come in an order in which a server takes them:
 // entries that go, leaves first; entries that change; entries that come, parents first.
 #include <algorithm>
+#include <memory>
 #include <new>
+#include <set>
 #include <unordered_map>
 #include <unordered_set>
 
@@ -15,6 +17,7 @@
 #include "servers/vrnd/libdirbase/model/attribute.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
 #include "servers/vrnd/libdirbase/model/value_compare.h"
+#include "tools/dirbase/current_failure.h"
 #include "tools/dirbase/ldif_commands.h"
 #include "tools/dirbase/ldif_reader.h"
 #include "tools/dirbase/text_file.h"
@@ -42,7 +45,7 @@ public:
     bool is_whole() const { return whole_; }
 
 private:
-    void take(std::string_view entry, std::size_t line, const std::string& source);
+    void take(const ldif_entry_text& entry, const std::string& source);
 
     std::vector<entry_pointer> entries_;
     std::unordered_map<std::string_view, const Entry*> by_dn_;
@@ -54,32 +57,25 @@ ldif_side::ldif_side(const std::string& file)
 {
     ldif_reader reader(file, false);
     for (ldif_batch batch; reader.next(batch);) {
-        if (batch.too_large != 0) {
-            throw tool_failure(status_unusable, source_name(file), static_cast<int>(batch.first_line),
-                               "an entry of more than 16 MiB");
-        }
         const schema_reader guard;
-        std::string_view rest = batch.text;
-        for (std::size_t line = batch.first_line; !rest.empty();) {
-            const std::string_view entry = take_entry(rest);
-            take(entry, line, source_name(file));
-            line += static_cast<std::size_t>(std::count(entry.begin(), entry.end(), '\n'));
+        for (ldif_entry_text entry; take_entry(batch, entry);) {
+            take(entry, source_name(file));
         }
     }
 }
 
-void ldif_side::take(std::string_view entry, std::size_t line, const std::string& source)
+void ldif_side::take(const ldif_entry_text& entry, const std::string& source)
 {
     ldif_fault_list faults;
     entry_pointer made;
-    if (text_.parse(entry, line, faults) == ldif_text::content::entry && faults.empty()) {
+    if (text_.parse(entry, faults) == ldif_text::content::entry && faults.empty()) {
         made = make_entry(text_, true, faults);
     }
     if (made != nullptr && !by_dn_.emplace(made->e_norm_dn, made.get()).second) {
         faults.add(ldif_fault_kind::second_dn, text_.line(), "", "the file has this entry already");
     }
-    for (const ldif_fault& fault : faults.kept()) {
-        tell(line_of(fault, source, text_.dn() == nullptr ? "" : text_.dn()->value));
+    for (const std::string& line : lines_of(faults, text_, source)) {
+        tell(line);
         whole_ = false;
     }
     if (made != nullptr && faults.empty()) {
@@ -136,39 +132,78 @@ bool holds_bytes(const Attribute& attribute)
     return static_cast<unsigned>(attribute.a_syntax) == SC_BIN;
 }
 
-// The values of one attribute that another lacks.
-std::vector<const berval*> values_missing(const Attribute& from, const Attribute& in)
-{
-    std::vector<const berval*> missing;
-    std::unordered_set<std::string_view> bytes;
-    if (holds_bytes(in)) {
-        for (std::int64_t i = 0; i < in.a_numvals; ++i) {
-            bytes.insert(bytes_of(*in.a_vals[i]));
-        }
-    }
-    const auto syntax = static_cast<std::uint32_t>(in.a_syntax);
-    for (std::int64_t i = 0; i < from.a_numvals; ++i) {
-        const berval* const value = from.a_vals[i];
-        bool found = false;
-        if (holds_bytes(in)) {
-            found = bytes.contains(bytes_of(*value));
-        } else if (const int answer = value_find(&in, value, syntax, 1); answer >= 0) {
-            found = answer == 0;
-        } else {
-            found = std::any_of(in.a_vals, in.a_vals + in.a_numvals, [value, syntax](const berval* other) {
-                return bytes_of(*other) == bytes_of(*value) || value_cmp(other, value, syntax, 3) == 0;
-            });
-        }
-        if (!found) {
-            missing.push_back(value);
-        }
-    }
-    return missing;
-}
-
 std::vector<const berval*> all_values(const Attribute& attribute)
 {
     return {attribute.a_vals, attribute.a_vals + attribute.a_numvals};
+}
+
+// Finds values of an attribute, however many there are: by their syntax, and those that it refuses by their bytes. An
+// attribute's value tree is used where it has one; it has none when a value was refused, or is encrypted.
+class value_index {
+public:
+    explicit value_index(const Attribute& attribute)
+        : attribute_(attribute), has_tree_(attribute.a_tree != nullptr && !holds_bytes(attribute))
+    {
+        for (std::int64_t i = 0; i < attribute.a_numvals && !has_tree_; ++i) {
+            const berval& value = *attribute.a_vals[i];
+            bytes_.insert(bytes_of(value));
+            if (node_pointer node = node_of(value); node != nullptr) {
+                nodes_.insert(std::move(node));
+            }
+        }
+    }
+
+    bool has(const berval& value) const
+    {
+        if (has_tree_) {
+            return value_find(&attribute_, &value, static_cast<std::uint32_t>(attribute_.a_syntax), 1) == 0;
+        }
+        if (bytes_.contains(bytes_of(value))) {
+            return true;
+        }
+        const node_pointer node = node_of(value);
+        return node != nullptr && nodes_.contains(node);
+    }
+
+private:
+    struct free_node {
+        void operator()(AttrvalsNorm* node) const noexcept { free_AttrvalsNorm(node); }
+    };
+    using node_pointer = std::unique_ptr<AttrvalsNorm, free_node>;
+    struct order {
+        bool operator()(const node_pointer& a, const node_pointer& b) const
+        {
+            return value_cmp_fast(a.get(), b.get()) < 0;
+        }
+    };
+
+    // Null for a value that the syntax refuses, and for bytes.
+    node_pointer node_of(const berval& value) const
+    {
+        AttrvalsNorm* made = nullptr;
+        if (holds_bytes(attribute_)) {
+            return nullptr;
+        }
+        const auto syntax = static_cast<std::uint32_t>(attribute_.a_syntax);
+        if (create_normalized_berval_in_attrvalsNorm(&made, &value, syntax, 1) == LDAP_NO_MEMORY) {
+            throw std::bad_alloc();
+        }
+        return node_pointer(made);
+    }
+
+    const Attribute& attribute_;
+    bool has_tree_;
+    std::unordered_set<std::string_view> bytes_;
+    std::set<node_pointer, order> nodes_;
+};
+
+// The values of one attribute that another lacks.
+std::vector<const berval*> values_missing(const Attribute& from, const Attribute& in)
+{
+    const value_index index(in);
+    std::vector<const berval*> missing = all_values(from);
+    std::erase_if(missing, [&index](const berval* value) { return index.has(*value); });
+    return missing;
 }
 
 void append_modification(std::string& text, const char* operation, const Attribute& attribute,
@@ -265,11 +300,13 @@ public:
     explicit change_writer(bool as_json) : as_json_(as_json) {}
 
     void write(const Entry& entry, const char* type, const std::string& body);
-    void finish(std::size_t deleted, std::size_t modified, std::size_t added);
+    void finish(const tool_failure* failure);
+    int status() const { return begun_ ? status_findings : status_yes; }
 
 private:
     bool as_json_;
     bool begun_ = false;
+    std::unordered_map<std::string_view, std::size_t> counts_;  // by the types
 };
 
 void change_writer::write(const Entry& entry, const char* type, const std::string& body)
@@ -286,14 +323,21 @@ void change_writer::write(const Entry& entry, const char* type, const std::strin
         text.insert(0, begun_ ? "\n" : "version: 1\n\n");
     }
     begun_ = true;
+    ++counts_[type];
     write_result(text);
 }
 
-void change_writer::finish(std::size_t deleted, std::size_t modified, std::size_t added)
+void change_writer::finish(const tool_failure* failure)
 {
     if (as_json_) {
-        const json rest = {
-            {"deleted", deleted}, {"modified", modified}, {"added", added}, {"same", !begun_}, {"ok", true}};
+        json rest = {{"deleted", counts_["delete"]},
+                     {"modified", counts_["modify"]},
+                     {"added", counts_["add"]},
+                     {"same", failure == nullptr && !begun_},
+                     {"ok", failure == nullptr && !begun_}};
+        if (failure != nullptr) {
+            rest["error"] = json_of(*failure);
+        }
         write_result((begun_ ? "\n  ],\n" : "{\n  \"changes\": [],\n") + rest.dump(2).substr(2) + "\n");
     }
 }
@@ -309,25 +353,13 @@ void tell_orphans(const ldif_side& before, const ldif_side& after)
     }
 }
 
-}  // namespace
-
-int diff_ldif(const common_options& common, const std::string& before_file, const std::string& after_file)
+// Writes the changes in their order.
+void write_changes(const ldif_side& before, const ldif_side& after, change_writer& out)
 {
-    load_for_entries(common);
-    if (before_file == standard_input && after_file == standard_input) {
-        throw tool_failure(status_unusable, "", 0, "only one of the files can be standard input");
-    }
-    const ldif_side before(before_file);
-    const ldif_side after(after_file);
-    if (!before.is_whole() || !after.is_whole()) {
-        throw tool_failure(status_unusable, "", 0, "what isn't whole can't be compared");
-    }
     const schema_reader guard;
     attribute_rules rules;
-    change_writer out(common.as_json);
     std::vector<const Entry*> going;
     std::vector<const Entry*> coming;
-    std::size_t modified = 0;
     for (const entry_pointer& entry : before.entries()) {
         if (after.find(entry->e_norm_dn) == nullptr) {
             going.push_back(entry.get());
@@ -349,16 +381,32 @@ int diff_ldif(const common_options& common, const std::string& before_file, cons
         if (const Entry* const now = after.find(entry->e_norm_dn); now != nullptr) {
             if (const std::string changes = modifications(*entry, *now, rules); !changes.empty()) {
                 out.write(*entry, "modify", changes);
-                ++modified;
             }
         }
     }
     for (const Entry* entry : coming) {
         out.write(*entry, "add", all_lines(*entry, rules));
     }
-    out.finish(going.size(), modified, coming.size());
-    tell_orphans(before, after);
-    return going.empty() && coming.empty() && modified == 0 ? status_yes : status_findings;
+}
+
+}  // namespace
+
+int diff_ldif(const common_options& common, const std::string& before_file, const std::string& after_file)
+{
+    load_for_entries(common);
+    if (before_file == standard_input && after_file == standard_input) {
+        throw tool_failure(status_unusable, "", 0, "only one of the files can be standard input");
+    }
+    const ldif_side before(before_file);
+    const ldif_side after(after_file);
+    if (!before.is_whole() || !after.is_whole()) {
+        throw tool_failure(status_unusable, "", 0, "what isn't whole can't be compared");
+    }
+    change_writer out(common.as_json);
+    return write_results(common.as_json, out, [&] {
+        write_changes(before, after, out);
+        tell_orphans(before, after);
+    });
 }
 
 }  // namespace dirbase_tool

@@ -43,19 +43,36 @@ std::string_view value_of(const ldif_line& line)
     return {line.value, line.length};
 }
 
+// The values of attributes that are compared byte for byte. The library compares such a value with each that is there,
+// which takes too long for very many.
+using byte_values = std::unordered_map<const Attribute*, std::unordered_set<std::string_view>>;
+
+// Adds the value of a line.
+//
+//   normalize  whether it has to be of its syntax, and is left out when the attribute has it
+int merge(Entry& entry, const ldif_line& line, bool normalize)
+{
+    berval value = {line.length, line.value};
+    berval* values[] = {&value, nullptr};
+    return not_without_memory(attr_merge(&entry, line.type, values, normalize ? 1 : 0, normalize ? 1 : 0, line.info));
+}
+
+// Adds the value of a line as it is, unless it is among those that were added so.
+int merge_bytes(Entry& entry, const ldif_line& line, byte_values& known)
+{
+    berval* none[] = {nullptr};
+    const int result = not_without_memory(attr_merge(&entry, line.type, none, 0, 0, line.info));  // makes the record
+    if (result != LDAP_SUCCESS || !known[attr_find(&entry, line.type, 0, line.info)].insert(value_of(line)).second) {
+        return result;
+    }
+    return merge(entry, line, false);
+}
+
 // What a value of a syntax has to be.
 const char* words_of_syntax(std::uint32_t syntax)
 {
-    switch (syntax) {
-    case SC_INT: return "is no integer from -2147483648 to 2147483647";
-    case SC_BOOL: return "is neither TRUE nor FALSE";
-    case SC_GT: return "is no time of the form YYYYMMDDHHMMSS[.F](Z|+HHMM|-HHMM)";
-    case SC_UTCT: return "is no time of the form YYMMDDHHMM[SS](Z|+HHMM|-HHMM)";
-    case SC_CIS | SC_BIT_STRING: return "is no bit string of the form '0101'B";
-    case SC_CIS | SC_NUMERIC_STRING: return "is no numeric string: digits without spaces between them";
-    case SC_CIS | SC_COUNTRY_STRING: return "is no country code of two letters";
-    default: return "is refused by the syntax of the attribute";
-    }
+    const char* const words = fault_of_syntax(syntax);
+    return words != nullptr ? words : "is refused by the syntax of the attribute";
 }
 
 // Adds the values of an entry one after the other, and says what an addition would have against them.
@@ -83,7 +100,7 @@ private:
     ldif_text& text_;
     ldif_fault_list& faults_;
     std::vector<const asyntaxinfo*> spoilt_;
-    std::unordered_map<const Attribute*, std::unordered_set<std::string_view>> bytes_;
+    byte_values bytes_;
     const ldif_line* last_ = nullptr;  // the line that was added last, and its attribute
     Attribute* attribute_ = nullptr;
     std::size_t attributes_ = 0;
@@ -172,11 +189,7 @@ bool value_check::add(ldif_line& line)
         attribute_ = attr_find(&entry_, line.type, 0, line.info);
     }
     const std::int64_t before = attribute_ == nullptr ? 0 : attribute_->a_numvals;
-    berval value = {line.length, line.value};
-    berval* values[] = {&value, nullptr};
-    // The library compares a value of bytes with each that is there, which takes too long for very many.
-    const int result =
-        not_without_memory(attr_merge(&entry_, line.type, values, is_bytes ? 0 : 1, is_bytes ? 0 : 1, line.info));
+    const int result = merge(entry_, line, !is_bytes);
     if (attribute_ == nullptr) {
         attribute_ = attr_find(&entry_, line.type, 0, line.info);
         if (attribute_ != nullptr && ++attributes_ > attribute_limit) {
@@ -415,28 +428,36 @@ bool add_values(Entry& entry, ldif_text& text, bool complete, ldif_fault_list& f
 {
     const bool may_be_too_many = text.lines().size() > attribute_limit;
     std::unordered_set<std::string_view> types;
+    byte_values bytes;
+    std::vector<const ldif_line*> refused;
+    const auto tell = [&faults](const ldif_line& line, int result) {
+        if (result != LDAP_SUCCESS) {
+            faults.add(kind::bad_option, line.line, line.type, result_words(result));
+        }
+    };
     for (ldif_line& line : text.lines()) {
         if (may_be_too_many && types.insert(line.type).second && types.size() > attribute_limit) {
             faults.add(kind::too_large, text.line(), "",
                        "more than " + std::to_string(attribute_limit) + " attributes");
             return false;
         }
-        berval value = {line.length, line.value};
-        berval* values[] = {&value, nullptr};
-        int result = complete ? LDAP_OTHER : LDAP_SUCCESS;
-        if (complete) {
-            result = not_without_memory(attr_merge(&entry, line.type, values, 1, 1, nullptr));
+        if (!complete) {
+            tell(line, merge(entry, line, false));
+            continue;
         }
-        // A value that its syntax refuses is taken as it is.
-        if (!complete || result != LDAP_SUCCESS) {
-            result = not_without_memory(attr_merge(&entry, line.type, values, 0, 0, nullptr));
-        }
-        if (result != LDAP_SUCCESS) {
-            faults.add(kind::bad_option, line.line, line.type, result_words(result));
+        line.info = ldcf_api_attr_get_info(line.type, nullptr);
+        if (line.info != nullptr && line.info->syntax == SC_BIN) {
+            tell(line, merge_bytes(entry, line, bytes));
+        } else if (merge(entry, line, true) != LDAP_SUCCESS) {
+            refused.push_back(&line);
         }
     }
     if (complete) {
         not_without_memory(expand_rdn_esc(&entry));
+    }
+    // They are taken as they are. Behind the others, for each costs the attribute its value tree.
+    for (const ldif_line* line : refused) {
+        tell(*line, merge_bytes(entry, *line, bytes));
     }
     return faults.empty();
 }

@@ -37,7 +37,7 @@ entry_pointer new_entry(const ldif_text& text, ldif_fault_list& faults);
 // many attributes, and when `faults` had one before. A name or an option that the schema doesn't know is kept.
 //
 //   complete  whether the naming attributes are added, as a server does, and values that an attribute has already are
-//             dropped
+//             dropped; values that their syntax refuses come last then
 bool add_values(Entry& entry, ldif_text& text, bool complete, ldif_fault_list& faults);
 
 // Both: the entry of a text, or null with a fault.

@@ -1,11 +1,14 @@
 // What may be wrong with an entry of an LDIF file: see ldif_faults.h.
 #include "tools/dirbase/ldif_faults.h"
 
+#include <algorithm>
+
 namespace dirbase_tool {
 
 namespace {
 
 constexpr std::size_t longest_quote = 80;
+constexpr std::size_t longest_member = 16384;  // of the JSON of a fault
 
 // In the order of the kinds.
 constexpr ldif_fault_words words[] = {
@@ -40,6 +43,23 @@ constexpr ldif_fault_words words[] = {
 };
 static_assert(std::size(words) == ldif_fault_kinds);
 
+// The longest beginning of a text that has at most `length` bytes and doesn't end inside a character.
+std::string_view beginning_of(std::string_view text, std::size_t length)
+{
+    std::size_t end = std::min(length, text.size());
+    while (end < text.size() && end > length - 4 && (static_cast<unsigned char>(text[end]) & 0xC0) == 0x80) {
+        --end;
+    }
+    return text.substr(0, end);
+}
+
+std::string cut(const std::string& text)
+{
+    return text.size() <= longest_member
+               ? text
+               : std::string(beginning_of(text, longest_member)) + "... (" + std::to_string(text.size()) + " bytes)";
+}
+
 }  // namespace
 
 const ldif_fault_words& words_of(ldif_fault_kind kind)
@@ -66,17 +86,14 @@ void ldif_fault_list::clear()
 
 std::string quoted(std::string_view value)
 {
-    std::string text = "\"";
-    if (value.size() <= longest_quote) {
-        text += value;
-        return text + "\"";
-    }
-    std::size_t end = longest_quote;
-    while (end > longest_quote - 4 && (static_cast<unsigned char>(value[end]) & 0xC0) == 0x80) {
-        --end;  // not inside a character
-    }
-    text += value.substr(0, end);
-    return text + "...\"";
+    const std::string_view shown = beginning_of(value, longest_quote);
+    return "\"" + std::string(shown) + (shown.size() < value.size() ? "...\"" : "\"");
+}
+
+std::string words_for_left_out(const ldif_fault_list& faults)
+{
+    const bool is_one = faults.left_out() == 1;
+    return "and " + std::to_string(faults.left_out()) + (is_one ? " more fault" : " more faults") + " in this entry";
 }
 
 std::string text_of(const ldif_fault& fault)
@@ -97,13 +114,13 @@ json json_of(const ldif_fault& fault, const std::string& source, const std::stri
 {
     json member = {{"file", source}, {"line", fault.line}};
     if (!dn.empty()) {
-        member["dn"] = dn;
+        member["dn"] = cut(dn);
     }
     member["kind"] = words_of(fault.kind).name;
     if (!fault.subject.empty()) {
-        member["subject"] = fault.subject;
+        member["subject"] = cut(fault.subject);
     }
-    member["reason"] = fault.reason;
+    member["reason"] = cut(fault.reason);
     return member;
 }
 

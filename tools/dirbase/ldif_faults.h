@@ -84,12 +84,16 @@ private:
 // A value as a message shows it: in quotes, and cut when it is long.
 std::string quoted(std::string_view value);
 
+// "and N more faults in this entry", of those that were counted only.
+std::string words_for_left_out(const ldif_fault_list& faults);
+
 // "REASON" or "SUBJECT: REASON".
 std::string text_of(const ldif_fault& fault);
 
 // "FILE:LINE: DN: SUBJECT: REASON", on one line; without the DN when the entry has none.
 std::string line_of(const ldif_fault& fault, const std::string& source, const std::string& dn);
 
+// DN, subject and reason are cut where line_of cuts: they may be as large as an entry, and there may be many of them.
 json json_of(const ldif_fault& fault, const std::string& source, const std::string& dn);
 
 }  // namespace dirbase_tool

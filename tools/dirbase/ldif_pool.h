@@ -9,10 +9,13 @@
 #include <deque>
 #include <exception>
 #include <mutex>
+#include <string>
+#include <system_error>
 #include <thread>
 #include <vector>
 
 #include "tools/dirbase/ldif_reader.h"
+#include "tools/dirbase/report.h"
 
 namespace dirbase_tool {
 
@@ -45,6 +48,9 @@ public:
             for (Worker& worker : workers_) {
                 threads_.emplace_back([this, &worker] { run(worker); });
             }
+        } catch (const std::system_error& failure) {
+            stop();
+            throw tool_failure(status_unusable, "", 0, std::string("can't start a thread: ") + failure.what());
         } catch (...) {
             stop();
             throw;
@@ -128,19 +134,22 @@ private:
 // Has every batch of a file worked on.
 //
 //   Item         has a member `batch`, which is read into; items are used again
-//   make_worker  gives what a thread calls with each of its items; called by this thread, once for each
-//   take         called by this thread with each item, in the order of the file, when the work on it is done. False
-//                ends it all, and the rest isn't read.
+//   make_worker  gives what a thread calls with each of its items, to take entries off the batch until it is taken or
+//                results_limit is reached; called by this thread, once for each
+//   take         called by this thread with each item, in the order of the file, when the work on it is done, and
+//                again while the batch isn't taken. False ends it all, and the rest isn't read.
 template <typename Item, typename MakeWorker, typename Take>
 void for_each_batch(ldif_reader& reader, unsigned threads, const MakeWorker& make_worker, const Take& take)
 {
     if (threads == 1) {
         auto worker = make_worker();
         for (Item item; reader.next(item.batch);) {
-            worker(item);
-            if (!take(item)) {
-                return;
-            }
+            do {
+                worker(item);
+                if (!take(item)) {
+                    return;
+                }
+            } while (!item.batch.is_taken());
         }
         return;
     }
@@ -168,7 +177,11 @@ void for_each_batch(ldif_reader& reader, unsigned threads, const MakeWorker& mak
         if (!take(oldest().item)) {
             return;
         }
-        ++taken;
+        if (oldest().item.batch.is_taken()) {
+            ++taken;
+        } else {
+            pool.hand_over(oldest());
+        }
     }
 }
 

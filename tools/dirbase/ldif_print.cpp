@@ -1,5 +1,4 @@
 // dirbase ldif print
-#include <algorithm>
 #include <cstdlib>
 #include <new>
 
@@ -7,6 +6,7 @@
 #include "servers/vrnd/libdirbase/base/heap.h"
 #include "servers/vrnd/libdirbase/model/entry_ber.h"
 #include "servers/vrnd/libdirbase/model/entry_text.h"
+#include "tools/dirbase/current_failure.h"
 #include "tools/dirbase/ldif_commands.h"
 #include "tools/dirbase/ldif_reader.h"
 #include "tools/dirbase/text_file.h"
@@ -83,60 +83,94 @@ std::string entry_writer::write(const Entry& entry)
     return result;
 }
 
+// Prints entries, one after the other.
+class entry_printer {
+public:
+    entry_printer(ldif_form form, const std::string& source, bool as_json)
+        : writer_(form), source_(source), as_json_(as_json)
+    {
+    }
+
+    void print(const ldif_entry_text& entry);
+    void write_out();
+    void finish(const tool_failure* failure);
+    int status() const { return refused_ ? status_findings : status_yes; }
+
+private:
+    entry_writer writer_;
+    std::string source_;
+    bool as_json_;
+    ldif_text text_;
+    ldif_fault_list faults_;
+    std::string out_;  // what isn't written yet
+    bool begun_ = false;
+    bool refused_ = false;
+};
+
+void entry_printer::print(const ldif_entry_text& entry)
+{
+    faults_.clear();
+    entry_pointer made;
+    if (text_.parse(entry, faults_) == ldif_text::content::entry && faults_.empty()) {
+        made = make_entry(text_, false, faults_);
+    }
+    for (const std::string& line : lines_of(faults_, text_, source_, "; the entry is left out")) {
+        tell(line);
+        refused_ = true;
+    }
+    if (made == nullptr) {
+        return;
+    }
+    const std::string form = writer_.write(*made);
+    if (as_json_) {
+        out_ += (begun_ ? ",\n    " : "{\n  \"entries\": [\n    ") +
+                json({{"dn", made->e_dn}, {"text", form}}).dump(-1, ' ', false, json::error_handler_t::replace);
+    } else {
+        out_ += (begun_ ? "\n" : "") + form;
+    }
+    begun_ = true;
+    if (out_.size() >= results_limit) {
+        write_out();
+    }
+}
+
+void entry_printer::write_out()
+{
+    write_result(out_);
+    out_.clear();
+}
+
+// Writes what comes last; with a failure that ended the work ahead of its time.
+void entry_printer::finish(const tool_failure* failure)
+{
+    write_out();
+    if (!as_json_) {
+        return;
+    }
+    json rest = {{"ok", failure == nullptr && !refused_}};
+    if (failure != nullptr) {
+        rest["error"] = json_of(*failure);
+    }
+    write_result((begun_ ? "\n  ],\n" : "{\n  \"entries\": [],\n") +
+                 rest.dump(2, ' ', false, json::error_handler_t::replace).substr(2) + "\n");
+}
+
 }  // namespace
 
 int print_ldif(const common_options& common, const std::string& file, ldif_form form)
 {
     load_for_entries(common);
-    const std::string source = source_name(file);
     ldif_reader reader(file, false);
-    entry_writer writer(form);
-    ldif_text text;
-    ldif_fault_list faults;
-    bool refused = false;
-    std::size_t printed = 0;
-    if (common.as_json) {
-        write_result("{\n  \"entries\": [");
-    }
-    for (ldif_batch batch; reader.next(batch);) {
-        const schema_reader guard;
-        std::string out;
-        std::string_view rest = batch.text;
-        std::size_t line = batch.first_line;
-        while (!rest.empty()) {
-            const std::string_view entry = batch.too_large != 0 ? std::exchange(rest, {}) : take_entry(rest);
-            faults.clear();
-            entry_pointer made;
-            if (batch.too_large != 0 || entry.size() > entry_limit) {
-                faults.add(ldif_fault_kind::too_large, line, "", "an entry of more than 16 MiB");
-            } else if (text.parse(entry, line, faults) == ldif_text::content::entry && faults.empty()) {
-                made = make_entry(text, false, faults);
+    entry_printer printer(form, source_name(file), common.as_json);
+    return write_results(common.as_json, printer, [&] {
+        for (ldif_batch batch; reader.next(batch);) {
+            const schema_reader guard;
+            for (ldif_entry_text entry; take_entry(batch, entry);) {
+                printer.print(entry);
             }
-            line += static_cast<std::size_t>(std::count(entry.begin(), entry.end(), '\n'));
-            for (const ldif_fault& fault : faults.kept()) {
-                tell(line_of(fault, source, text.dn() == nullptr ? "" : text.dn()->value) + "; the entry is left out");
-                refused = true;
-            }
-            if (made == nullptr) {
-                continue;
-            }
-            const std::string form_of_entry = writer.write(*made);
-            if (common.as_json) {
-                out +=
-                    (printed == 0 ? "\n    " : ",\n    ") + json({{"dn", made->e_dn}, {"text", form_of_entry}})
-                                                                .dump(-1, ' ', false, json::error_handler_t::replace);
-            } else {
-                out += (printed == 0 ? "" : "\n") + form_of_entry;
-            }
-            ++printed;
+            printer.write_out();
         }
-        write_result(out);
-    }
-    if (common.as_json) {
-        write_result(std::string(printed == 0 ? "" : "\n  ") + "],\n  \"ok\": " + (refused ? "false" : "true") +
-                     "\n}\n");
-    }
-    return refused ? status_findings : status_yes;
+    });
 }
 
 }  // namespace dirbase_tool

@@ -20,6 +20,7 @@ namespace {
 constexpr std::size_t chunk_size = std::size_t{1} << 17;
 constexpr std::size_t head_size = std::size_t{1} << 12;  // of an entry that is passed by
 constexpr std::size_t none = std::string_view::npos;
+constexpr std::string_view byte_order_mark = "\xEF\xBB\xBF";  // of UTF-8 (RFC 3629 section 6)
 
 // Whether the line feed at `at` ends an empty line. A line ends with a line feed, or a carriage return in front of one.
 bool ends_empty_line(std::string_view text, std::size_t at)
@@ -45,6 +46,27 @@ std::size_t behind_last_entry(std::string_view text, std::size_t from)
 std::size_t count_lines(std::string_view text)
 {
     return static_cast<std::size_t>(std::count(text.begin(), text.end(), '\n'));
+}
+
+// The end of the first entry of a text, with the empty lines behind it.
+std::size_t end_of_entry(std::string_view text)
+{
+    std::size_t end = 0;
+    bool begun = false;
+    while (end < text.size()) {
+        const std::size_t line_feed = text.find('\n', end);
+        if (line_feed == none) {
+            end = text.size();
+            break;
+        }
+        const bool empty = ends_empty_line(text, line_feed);
+        if (begun && !empty && ends_empty_line(text, end - 1)) {
+            break;
+        }
+        begun = begun || !empty;
+        end = line_feed + 1;
+    }
+    return end;
 }
 
 void write_aside(std::FILE* file, std::string_view text)
@@ -119,7 +141,8 @@ bool ldif_reader::next(ldif_batch& batch)
 {
     batch.text.clear();
     batch.text.swap(carried_);
-    batch.first_line = line_;
+    batch.taken = 0;
+    batch.line = line_;
     batch.too_large = 0;
     batch.aside.reset();
     for (std::size_t searched = 0;;) {
@@ -177,26 +200,20 @@ void ldif_reader::pass_by(ldif_batch& batch)
     }
 }
 
-std::string_view take_entry(std::string_view& text)
+bool take_entry(ldif_batch& batch, ldif_entry_text& entry)
 {
-    std::size_t end = 0;
-    bool begun = false;
-    while (end < text.size()) {
-        const std::size_t line_feed = text.find('\n', end);
-        if (line_feed == none) {
-            end = text.size();
-            break;
-        }
-        const bool empty = ends_empty_line(text, line_feed);
-        if (begun && !empty && ends_empty_line(text, end - 1)) {
-            break;
-        }
-        begun = begun || !empty;
-        end = line_feed + 1;
+    if (batch.line == 1 && batch.taken == 0 && batch.text.starts_with(byte_order_mark)) {
+        batch.taken = byte_order_mark.size();
     }
-    const std::string_view entry = text.substr(0, end);
-    text.remove_prefix(end);
-    return entry;
+    const std::string_view text = std::string_view(batch.text).substr(batch.taken);
+    if (text.empty()) {
+        return false;
+    }
+    const std::size_t end = batch.too_large != 0 ? text.size() : end_of_entry(text);
+    entry = {text.substr(0, end), batch.line, batch.too_large != 0 ? batch.too_large : end};
+    batch.taken += end;
+    batch.line += count_lines(entry.text);
+    return true;
 }
 
 }  // namespace dirbase_tool

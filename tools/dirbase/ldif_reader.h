@@ -15,6 +15,10 @@ namespace dirbase_tool {
 // The largest entry that is looked at, in bytes of its text.
 constexpr std::size_t entry_limit = std::size_t{16} << 20;
 
+// How many bytes of results are gathered before they are written, not counting those of the last entry. A batch may
+// come to far more, since a short line can name a large file.
+constexpr std::size_t results_limit = std::size_t{1} << 20;
+
 struct close_file {
     void operator()(std::FILE* file) const noexcept { std::fclose(file); }
 };
@@ -22,9 +26,19 @@ using file_pointer = std::unique_ptr<std::FILE, close_file>;
 
 struct ldif_batch {
     std::string text;             // entries with the empty lines behind them, as they stood
-    std::size_t first_line = 1;   // number of its first line
+    std::size_t taken = 0;        // how many bytes of that take_entry has taken
+    std::size_t line = 1;         // number of the first line behind them
     std::uint64_t too_large = 0;  // not 0: the one entry of the batch has so many bytes, and `text` its first ones
     file_pointer aside;           // that entry, from its first byte; null when nobody wants it
+
+    bool is_taken() const { return taken == text.size(); }
+};
+
+// An entry of a batch, in its text.
+struct ldif_entry_text {
+    std::string_view text;   // with the empty lines behind it; the first bytes of one that is beyond the limit
+    std::size_t line = 1;    // number of its first line
+    std::uint64_t size = 0;  // in bytes, all of them
 };
 
 class ldif_reader {
@@ -66,7 +80,8 @@ private:
     std::uint64_t bytes_in_all_ = 0;
 };
 
-// Takes the first entry, with the empty lines behind it, off a text of whole entries.
-std::string_view take_entry(std::string_view& text);
+// Takes the next entry off a batch; false at its end. A byte-order mark in front of the first entry of the file is no
+// part of it.
+bool take_entry(ldif_batch& batch, ldif_entry_text& entry);
 
 }  // namespace dirbase_tool

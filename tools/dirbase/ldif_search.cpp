@@ -20,6 +20,7 @@
 #include "servers/vrnd/libdirbase/model/dn_suffix.h"
 #include "servers/vrnd/libdirbase/model/filter_evaluation.h"
 #include "servers/vrnd/libdirbase/model/language_tag.h"
+#include "tools/dirbase/current_failure.h"
 #include "tools/dirbase/data_commands.h"
 #include "tools/dirbase/filter_text.h"
 #include "tools/dirbase/ldif_commands.h"
@@ -186,8 +187,8 @@ public:
     void operator()(work& item);
 
 private:
-    void search(work& item, std::string_view entry, std::size_t line);
-    entry_pointer read(std::string_view entry, std::size_t line);
+    void search(work& item, const ldif_entry_text& text);
+    entry_pointer read(const ldif_entry_text& text);
     void write(const Entry& entry, std::string& text);
 
     const search_settings& settings_;
@@ -203,30 +204,20 @@ void batch_searcher::operator()(work& item)
     item.remarks.clear();
     item.entries = 0;
     const schema_reader guard;
-    std::string_view rest = item.batch.text;
-    std::size_t line = item.batch.first_line;
-    while (!rest.empty()) {
-        const std::string_view entry = item.batch.too_large != 0 ? std::exchange(rest, {}) : take_entry(rest);
+    ldif_entry_text entry;
+    for (std::size_t told = 0; item.text.size() + told < results_limit && take_entry(item.batch, entry);) {
         faults_.clear();
-        if (item.batch.too_large != 0 || entry.size() > entry_limit) {
-            text_.parse(entry.substr(0, entry.substr(0, 4096).rfind('\n') + 1), line, faults_);  // for its DN
-            faults_.clear();
-            faults_.add(ldif_fault_kind::too_large, std::max(line, text_.line()), "", "an entry of more than 16 MiB");
-        } else {
-            search(item, entry, line);
+        search(item, entry);
+        for (std::string& line : lines_of(faults_, text_, settings_.source, "; the entry is passed over")) {
+            told += line.size();
+            item.remarks.push_back({item.ends.size(), LDAP_SUCCESS, std::move(line)});
         }
-        for (const ldif_fault& fault : faults_.kept()) {
-            const std::string dn = text_.dn() == nullptr ? "" : std::string(text_.dn()->value, text_.dn()->length);
-            item.remarks.push_back(
-                {item.ends.size(), LDAP_SUCCESS, line_of(fault, settings_.source, dn) + "; the entry is passed over"});
-        }
-        line += static_cast<std::size_t>(std::count(entry.begin(), entry.end(), '\n'));
     }
 }
 
-void batch_searcher::search(work& item, std::string_view text, std::size_t line)
+void batch_searcher::search(work& item, const ldif_entry_text& text)
 {
-    const entry_pointer entry = read(text, line);
+    const entry_pointer entry = read(text);
     if (entry == nullptr) {
         return;
     }
@@ -245,9 +236,9 @@ void batch_searcher::search(work& item, std::string_view text, std::size_t line)
 }
 
 // The entry of a text; null, perhaps with faults, for what isn't to be tested.
-entry_pointer batch_searcher::read(std::string_view text, std::size_t line)
+entry_pointer batch_searcher::read(const ldif_entry_text& text)
 {
-    if (text_.parse(text, line, faults_) != ldif_text::content::entry || !faults_.empty()) {
+    if (text_.parse(text, faults_) != ldif_text::content::entry || !faults_.empty()) {
         return nullptr;
     }
     entry_pointer entry = new_entry(text_, faults_);
@@ -299,21 +290,25 @@ std::string words_of_failure(int result)
 // Takes the searched batches in their order: writes and counts.
 class search_results {
 public:
-    search_results(const search_settings& settings, const ldif_reader& reader, std::size_t limit)
-        : settings_(settings), reader_(reader), limit_(limit)
+    // undefined: what is said about elements of the filter that are undefined.
+    search_results(const search_settings& settings, const ldif_reader& reader, std::size_t limit,
+                   std::vector<std::string> undefined)
+        : settings_(settings), reader_(reader), limit_(limit), undefined_(std::move(undefined))
     {
     }
 
     bool take(const work& item);
-    void finish(const tool_failure* failure, const std::vector<std::string>& undefined);
-    bool found_any() const { return matches_ != 0; }
+    void finish(const tool_failure* failure);
+    int status() const { return found_any() ? status_yes : status_findings; }
 
 private:
+    bool found_any() const { return matches_ != 0; }
     void show_progress();
 
     const search_settings& settings_;
     const ldif_reader& reader_;
     std::size_t limit_;
+    std::vector<std::string> undefined_;
     std::size_t entries_ = 0;
     std::size_t matches_ = 0;
     std::map<int, std::size_t> failures_;  // by their results
@@ -359,11 +354,8 @@ void search_results::show_progress()
     }
 }
 
-// Writes what comes last.
-//
-//   failure    what ended the work ahead of its time, or null
-//   undefined  what is said about elements of the filter that are undefined
-void search_results::finish(const tool_failure* failure, const std::vector<std::string>& undefined)
+// Writes what comes last; with a failure that ended the work ahead of its time.
+void search_results::finish(const tool_failure* failure)
 {
     progress_.clear();
     for (const auto& [result, count] : failures_) {
@@ -375,15 +367,15 @@ void search_results::finish(const tool_failure* failure, const std::vector<std::
         return;
     }
     json rest = {{"count", matches_}};
-    if (!undefined.empty()) {
-        rest["undefined"] = undefined;
+    if (!undefined_.empty()) {
+        rest["undefined"] = undefined_;
     }
     for (const auto& [result, count] : failures_) {
         rest["unevaluated"].push_back({{"entries", count}, {"result", result}, {"text", ldap_err2string(result)}});
     }
     rest["ok"] = failure == nullptr && found_any();
     if (failure != nullptr) {
-        rest["error"] = {{"file", failure->file()}, {"text", failure->what()}};
+        rest["error"] = json_of(*failure);
     }
     const std::string text = rest.dump(2, ' ', false, json::error_handler_t::replace) + "\n";
     const char* const entries = settings_.count_only ? "{\n" : found_any() ? "\n  ],\n" : "{\n  \"entries\": [],\n";
@@ -441,23 +433,14 @@ int search_ldif(const common_options& common, const ldif_search_call& call)
                                          call.count_only});
         settings->selection.tell_unknown();
     }
-    search_results out(*settings, reader, call.limit);
-    try {
+    search_results out(*settings, reader, call.limit, filter->remarks(true));
+    return write_results(common.as_json, out, [&] {
         if (settings->filter != nullptr) {
             for_each_batch<work>(
                 reader, ldif_threads(call.threads), [&settings] { return batch_searcher(*settings); },
                 [&out](const work& item) { return out.take(item); });
         }
-    } catch (const tool_failure& failure) {
-        if (!common.as_json) {
-            throw;
-        }
-        tell(failure.message());
-        out.finish(&failure, filter->remarks());
-        return failure.status();
-    }
-    out.finish(nullptr, filter->remarks());
-    return out.found_any() ? status_yes : status_findings;
+    });
 }
 
 }  // namespace dirbase_tool

@@ -17,6 +17,8 @@ namespace dirbase_tool {
 
 namespace {
 
+constexpr std::size_t head_size = 4096;  // of an entry that is too large; where its DN is looked for
+
 bool is_blank(char c)
 {
     return c == ' ' || c == '\t';
@@ -114,16 +116,30 @@ std::string read_url(std::string_view url, std::size_t limit, std::string& conte
 
 }  // namespace
 
-ldif_text::content ldif_text::parse(std::string_view text, std::size_t first_line, ldif_fault_list& faults)
+ldif_text::content ldif_text::parse(const ldif_entry_text& entry, ldif_fault_list& faults)
+{
+    if (entry.size <= entry_limit) {
+        return take_lines(entry.text, entry.line, faults);
+    }
+    const std::string_view head = entry.text.substr(0, head_size);
+    take_lines(head.substr(0, head.rfind('\n') + 1), entry.line, faults);
+    lines_.clear();
+    faults.clear();
+    faults.add(ldif_fault_kind::too_large, std::max(entry.line, line_), "",
+               "an entry of " + std::to_string(entry.size) + " bytes, more than " + std::to_string(entry_limit));
+    return content::too_large;
+}
+
+ldif_text::content ldif_text::take_lines(std::string_view text, std::size_t number, ldif_fault_list& faults)
 {
     room_.resize(std::max(room_.size(), text.size() + 1));
     used_ = 0;
     files_.clear();
+    file_bytes_ = 0;
     lines_.clear();
     has_dn_ = false;
     is_change_ = false;
     line_ = 0;
-    std::size_t number = first_line;
     while (!text.empty() && !is_change_) {
         const std::size_t begins = number;
         std::string_view joined;
@@ -188,25 +204,32 @@ bool ldif_text::take_apart(std::string_view joined, std::size_t number, ldif_fau
                    is_binary ? "the line holds a byte 0" : "no \":\" in " + quoted(joined));
         return false;
     }
-    std::string_view encoded = joined.substr(colon + 1);
-    const bool base64 = encoded.starts_with(':');
-    encoded.remove_prefix(base64 ? std::min<std::size_t>(encoded.size(), encoded.substr(1).starts_with(' ') ? 2 : 1)
-                                 : 0);
-    const bool is_text = zero == std::string_view::npos;
-    const bool well_encoded = !base64 || is_base64(encoded);
+    // The parser of the library isn't for this: it takes a byte 1 for the mark of a fold, and drops it.
+    char* const start = room_.data() + (joined.data() - room_.data());
+    start[joined.substr(0, colon).find_last_not_of(' ') + 1] = '\0';
+    std::string_view value = joined.substr(colon + 1);
+    const bool base64 = value.starts_with(':');
+    const bool is_url = value.starts_with('<');
+    if (base64 || is_url) {
+        value.remove_prefix(std::min(value.find_first_not_of(' ', 1), value.size()));
+    } else if (value.starts_with(' ')) {
+        value.remove_prefix(1);  // others belong to the value
+    }
     ldif_line line = {};
     line.line = number;
-    int is_url = 0;
-    char* const start = room_.data() + (joined.data() - room_.data());
-    if (!is_text || !well_encoded) {
-        start[colon + 1] = '\0';  // the type alone
-    }
-    str_parse_line_v_or_bv(start, &line.type, &line.value, &line.length, LDIF_MODE_ENTRY, &is_url, nullptr);
-    if (!is_text || !well_encoded) {
+    line.type = start;
+    line.value = start + joined.size() - value.size();
+    line.length = value.size();
+    const bool is_text = zero == std::string_view::npos;
+    if (!is_text || (base64 && !is_base64(value))) {
         line.spoilt = true;
         faults.add(is_text ? ldif_fault_kind::bad_base64 : ldif_fault_kind::nul_byte, number, line.type,
-                   is_text ? quoted(encoded) + " is no Base64" : "the line holds a byte 0");
-    } else if (is_url != 0) {
+                   is_text ? quoted(value) + " is no Base64" : "the line holds a byte 0");
+        line.value = start + joined.size();
+        line.length = 0;
+    } else if (base64) {
+        base64decode(line.value, line.value, &line.length);
+    } else if (is_url) {
         read_file(line, faults);
     }
     if (is_about_text(line, faults)) {
@@ -228,12 +251,9 @@ bool ldif_text::take_apart(std::string_view joined, std::size_t number, ldif_fau
 // Puts the content of a file in the place of its URL.
 void ldif_text::read_file(ldif_line& line, ldif_fault_list& faults)
 {
-    std::size_t left = entry_limit;
-    for (const std::string& earlier : files_) {
-        left -= std::min(left, earlier.size());
-    }
     std::string& file = files_.emplace_back();
-    const std::string wrong = read_url({line.value, line.length}, left, file);
+    const std::string wrong = read_url({line.value, line.length}, entry_limit - file_bytes_, file);
+    file_bytes_ = std::min(file_bytes_ + file.size(), entry_limit);  // one may have grown while it was read
     if (!wrong.empty()) {
         line.spoilt = true;
         faults.add(ldif_fault_kind::bad_url, line.line, line.type, wrong);
@@ -264,6 +284,24 @@ bool ldif_text::is_about_text(const ldif_line& line, ldif_fault_list& faults)
                    quoted({line.value, line.length}) + " is no addition of an entry, so there is nothing to check");
     }
     return true;
+}
+
+std::vector<std::string> lines_of(const ldif_fault_list& faults, const ldif_text& entry, const std::string& source,
+                                  const std::string& result)
+{
+    std::vector<std::string> lines;
+    for (const ldif_fault& fault : faults.kept()) {
+        lines.push_back(line_of(fault, source, dn_of(entry)) + result);
+    }
+    if (faults.left_out() != 0) {
+        lines.push_back(source + ":" + std::to_string(entry.line()) + ": " + words_for_left_out(faults));
+    }
+    return lines;
+}
+
+std::string dn_of(const ldif_text& entry)
+{
+    return entry.dn() == nullptr ? "" : std::string(entry.dn()->value, entry.dn()->length);
 }
 
 void append_ldif_line(std::string& text, const char* type, std::string_view value)

@@ -12,6 +12,8 @@ struct asyntaxinfo;
 
 namespace dirbase_tool {
 
+struct ldif_entry_text;
+
 // An attribute and a value. Behind the last byte of each stands a byte 0.
 struct ldif_line {
     char* type;
@@ -26,18 +28,17 @@ struct ldif_line {
 class ldif_text {
 public:
     enum class content {
-        nothing,  // comments, and perhaps the version of LDIF
-        entry,    // a DN and attributes, or what is meant to be that; perhaps with faults
-        change,   // something else to be done than the addition of an entry: a fault, and no lines are given
+        nothing,    // comments, and perhaps the version of LDIF
+        entry,      // a DN and attributes, or what is meant to be that; perhaps with faults
+        change,     // something else to be done than the addition of an entry: a fault, and no lines are given
+        too_large,  // an entry beyond entry_limit: the same, but for the DN when it stands at the beginning
     };
 
     // Takes an entry apart. Lines in comments, the version, and what says that an entry is to be added are passed over;
     // folded lines are joined, Base64 is decoded and the files that URLs name are read.
     //
-    //   text        the entry as it stands, with empty lines perhaps
-    //   first_line  the number of its first line
-    //   faults      takes what is wrong; a line that can't be read is left out
-    content parse(std::string_view text, std::size_t first_line, ldif_fault_list& faults);
+    //   faults  empty; takes what is wrong. A line that can't be read is left out.
+    content parse(const ldif_entry_text& entry, ldif_fault_list& faults);
 
     // The line that the entry begins with, and its DN: null when there is none.
     std::size_t line() const { return line_; }
@@ -45,6 +46,7 @@ public:
     std::vector<ldif_line>& lines() { return lines_; }
 
 private:
+    content take_lines(std::string_view text, std::size_t number, ldif_fault_list& faults);
     bool join(std::string_view& text, std::size_t& number, std::string_view& joined, ldif_fault_list& faults);
     bool take_apart(std::string_view joined, std::size_t number, ldif_fault_list& faults);
     void read_file(ldif_line& line, ldif_fault_list& faults);
@@ -53,12 +55,23 @@ private:
     std::vector<char> room_;  // texts and values
     std::size_t used_ = 0;
     std::deque<std::string> files_;  // contents of files that URLs name
+    std::size_t file_bytes_ = 0;     // of them all
     std::vector<ldif_line> lines_;
     ldif_line dn_ = {};
     bool has_dn_ = false;
     bool is_change_ = false;
     std::size_t line_ = 0;
 };
+
+// The lines that tell the faults of an entry.
+//
+//   source  what the file is called
+//   result  what stands behind each fault
+std::vector<std::string> lines_of(const ldif_fault_list& faults, const ldif_text& entry, const std::string& source,
+                                  const std::string& result = "");
+
+// The DN of an entry as it stands there; empty when there is none.
+std::string dn_of(const ldif_text& entry);
 
 // Adds a line of LDIF to a text, folded, the value in Base64 where it has to be.
 void append_ldif_line(std::string& text, const char* type, std::string_view value);

@@ -1,8 +1,14 @@
 // The command line of `dirbase`: groups, commands, options, and what becomes of a failure.
-#include <new>
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
 #include <sstream>
+#include <string_view>
 
 #include "tools/dirbase/command_line.h"
+#include "tools/dirbase/current_failure.h"
 #include "tools/dirbase/data_commands.h"
 
 namespace dirbase_tool {
@@ -41,12 +47,17 @@ changed is printed.
 
 FILE holds one definition, in a section as in a schema file. An attribute type may bring its extended
 definition in a second section; without one, replace takes the old one away. For delete only the oid and the
-names count, and names need not be given.
+names count, and names need not be given. A schema file that is a symbolic link is refused.
 )";
 
 constexpr char dn_details[] =
-    R"(DNs are looked up in the schema, so every spelling of a DN has one normal form. A DN that is - stands for
-those on standard input, one a line. Each DN has its answer, in their order.
+    R"(The attribute types of a DN are looked up in the schema, so every spelling of a DN has one normal form. A DN
+that is - stands for those on standard input, one a line. Each DN has its answer, in their order.
+)";
+
+constexpr char dn_check_details[] =
+    R"(The strict grammar needs no schema. A DN that is - stands for those on standard input, one a line. Each DN has
+its answer, in their order.
 )";
 
 constexpr char value_details[] =
@@ -90,6 +101,7 @@ void add_check(CLI::App& group, options& given, command& chosen)
     CLI::App* app =
         add_command(group, "check", "Load the schema and prove that it is whole", check_details, given.common);
     app->add_option("FILE", given.files, "Schema files to load after those of the directory, - for standard input")
+        ->check(not_empty())
         ->type_name("");
     app->callback(
         [&] { chosen = [&](message_collector& log) { return check_schema(given.common, given.files, log); }; });
@@ -142,8 +154,14 @@ void add_diff(CLI::App& group, options& given, command& chosen)
 {
     CLI::App* app = add_bare_command(group, "diff", "Tell how one schema directory differs from another", diff_details,
                                      given.common);
-    app->add_option("BEFORE", given.before, "The directory to compare with")->type_name("")->required();
-    app->add_option("AFTER", given.after, "The directory that may differ")->type_name("")->required();
+    app->add_option("BEFORE", given.before, "The directory to compare with")
+        ->check(not_empty())
+        ->type_name("")
+        ->required();
+    app->add_option("AFTER", given.after, "The directory that may differ")
+        ->check(not_empty())
+        ->type_name("")
+        ->required();
     app->callback(
         [&] { chosen = [&](message_collector&) { return diff_schemas(given.common, given.before, given.after); }; });
 }
@@ -157,6 +175,7 @@ void add_modify(CLI::App& group, options& given, command& chosen)
         ->type_name("")
         ->required();
     app->add_option("FILE", given.definition_file, "File of the definition, - for standard input")
+        ->check(not_empty())
         ->type_name("")
         ->required();
     app->callback([&] {
@@ -174,9 +193,11 @@ void add_light(CLI::App& app, options& given)
 void add_dn_question(CLI::App& group, const std::string& name, const std::string& description, dn_question question,
                      options& given, command& chosen)
 {
-    CLI::App* app = add_command(group, name, description, dn_details, given.common);
+    const bool uses_schema = question != dn_question::check;
+    CLI::App* app = uses_schema ? add_command(group, name, description, dn_details, given.common)
+                                : add_bare_command(group, name, description, dn_check_details, given.common);
     app->add_option("DN", given.dns, "Distinguished names, - for standard input")->type_name("")->required();
-    if (question != dn_question::check) {
+    if (uses_schema) {
         add_light(*app, given);
     }
     app->callback([&given, &chosen, question] {
@@ -222,25 +243,19 @@ void add_value_group(CLI::App& app, options& given, command& chosen)
     });
 }
 
-// Tells a failure, to the eyes and with --json to programs, and gives its exit status.
+// Tells a failure, to the eyes and with --json to programs, and gives its exit status. What can't be written to standard
+// output is told once, and to the eyes alone.
 int report(const tool_failure& failure, bool as_json)
 {
-    tell(failure.message());
-    if (!failure.note().empty()) {
-        tell("note: " + failure.note());
-    }
-    if (as_json) {
-        json error = {{"text", failure.what()}};
-        if (!failure.file().empty()) {
-            error["file"] = failure.file();
-        }
-        if (failure.line() > 0) {
-            error["line"] = failure.line();
-        }
+    const auto* const of_output = dynamic_cast<const output_failure*>(&failure);
+    if (of_output == nullptr || !of_output->is_repeated()) {
+        tell(failure.message());
         if (!failure.note().empty()) {
-            error["note"] = failure.note();
+            tell("note: " + failure.note());
         }
-        write_json(json{{"ok", false}, {"error", std::move(error)}});
+    }
+    if (as_json && of_output == nullptr) {
+        write_json(json{{"ok", false}, {"error", json_of(failure)}});
     }
     return failure.status();
 }
@@ -250,17 +265,17 @@ int run(const command& chosen, const common_options& common)
     message_collector log(common.verbosity);
     try {
         return chosen(log);
-    } catch (const tool_failure& failure) {
+    } catch (const output_failure& failure) {
         return report(failure, common.as_json);
-    } catch (const exc_t& failure) {
-        return report(failure_of(failure, common.schema_folder), common.as_json);
-    } catch (const std::bad_alloc&) {
-        return report(tool_failure(status_unusable, "", 0, "not enough memory"), common.as_json);
+    } catch (...) {
+        return report(current_failure(common.schema_folder), common.as_json);
     }
 }
 
 // Help and version go to standard output, and faults of the call to standard error.
-int report_call(const CLI::App& app, const CLI::ParseError& outcome)
+//
+//   as_json  whether a fault is an object on standard output too
+int report_call(const CLI::App& app, const CLI::ParseError& outcome, bool as_json)
 {
     std::ostringstream results;
     std::ostringstream faults;
@@ -270,7 +285,31 @@ int report_call(const CLI::App& app, const CLI::ParseError& outcome)
     for (std::string line; std::getline(lines, line);) {
         tell(line);
     }
+    if (status != 0 && as_json) {
+        write_json(json{{"ok", false}, {"error", {{"text", outcome.what()}}}});
+    }
     return status == 0 ? status_yes : status_unusable;
+}
+
+// Whether a call asks for JSON, also one that the parser gives up on before it comes to that.
+bool asks_for_json(int argc, char** argv)
+{
+    const std::vector<std::string_view> arguments(argv, argv + argc);
+    const auto end = std::find(arguments.begin(), arguments.end(), "--");
+    return std::find(arguments.begin(), end, "--json") != end;
+}
+
+// Takes the places of standard streams that are closed, or a file would be opened there and be taken for one of them.
+// Using such a stream fails as before: what stands in its place is open for the other direction.
+bool fill_standard_streams()
+{
+    for (const int handle : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
+        const bool is_closed = ::fcntl(handle, F_GETFD) < 0 && errno == EBADF;
+        if (is_closed && ::open("/dev/null", handle == STDIN_FILENO ? O_WRONLY : O_RDONLY) != handle) {
+            return false;
+        }
+    }
+    return true;
 }
 
 int main_of_tool(int argc, char** argv)
@@ -295,13 +334,15 @@ int main_of_tool(int argc, char** argv)
     add_filter_group(app, given.common, given.entries, chosen);
     add_ldif_group(app, given.common, given.entries, chosen);
 
+    unshield(app);
     try {
-        app.parse(argc, argv);
+        std::vector<std::string> arguments = shielded(argc, argv);
+        app.parse(arguments);
         if (!chosen) {
             throw CLI::RequiredError::Subcommand(1);
         }
     } catch (const CLI::ParseError& outcome) {
-        return report_call(app, outcome);
+        return report_call(app, outcome, asks_for_json(argc, argv));
     }
     return run(chosen, given.common);
 }
@@ -312,11 +353,13 @@ int main_of_tool(int argc, char** argv)
 
 int main(int argc, char** argv)
 {
+    if (!dirbase_tool::fill_standard_streams()) {
+        return dirbase_tool::status_unusable;  // with nowhere to say so
+    }
     try {
         return dirbase_tool::main_of_tool(argc, argv);
     } catch (const dirbase_tool::tool_failure& failure) {
-        dirbase_tool::tell(failure.message());  // the report itself couldn't be written
-        return failure.status();
+        return dirbase_tool::report(failure, false);  // the report itself couldn't be written
     } catch (const std::exception& failure) {
         dirbase_tool::tell(failure.what());
         return dirbase_tool::status_unusable;

@@ -1,10 +1,14 @@
 // What the tool says to its user: see report.h.
 #include "tools/dirbase/report.h"
 
+#include <unistd.h>
+
+#include <algorithm>
 #include <cerrno>
 #include <cstdio>
 #include <cstring>
 #include <new>
+#include <utility>
 
 #include "libraries/libldif/line64.h"
 #include "libraries/libmsg/debug_log.h"
@@ -18,11 +22,63 @@ namespace {
 constexpr std::size_t message_limit = 16384;
 constexpr std::size_t longest_shown_value = 80;
 
+constexpr int highest_system_error = 200;
+
+// The error of the operating system that an exception stands for; 0 when it stands for none. The library keeps the
+// number, or names it behind its own word: "permission_denied (EACCES)".
+int system_error_of(const exc_t& exception)
+{
+    if (dynamic_cast<const exc_unmapped_t*>(&exception) != nullptr) {
+        return static_cast<int>(exception.code());
+    }
+    const std::string text = text_of(exception.message().text());
+    const std::size_t blank = text.find(' ');
+    if (blank == std::string::npos || text.compare(blank, 3, " (E") != 0 || text.back() != ')') {
+        return 0;
+    }
+    const std::string name = text.substr(blank + 2, text.size() - blank - 3);
+    for (int error = 1; error <= highest_system_error; ++error) {
+        if (const char* const known = ::strerrorname_np(error); known != nullptr && name == known) {
+            return error;
+        }
+    }
+    return 0;
+}
+
 bool from_operating_system(const exc_t& exception)
 {
     return dynamic_cast<const exc_runtime_t*>(&exception) != nullptr ||
-           dynamic_cast<const exc_permission_denied_t*>(&exception) != nullptr ||
-           dynamic_cast<const exc_unmapped_t*>(&exception) != nullptr;
+           dynamic_cast<const exc_permission_denied_t*>(&exception) != nullptr;
+}
+
+std::string escaped(std::string_view text)
+{
+    bounded_text measure(nullptr, 0);
+    put_on_one_line(measure, text);
+    std::string result(measure.finish() + 1, '\0');
+    bounded_text out(result.data(), result.size());
+    put_on_one_line(out, text);
+    result.resize(out.finish());
+    return result;
+}
+
+bool writes_to_terminal()
+{
+    static const bool is_terminal = ::isatty(STDOUT_FILENO) != 0;
+    return is_terminal;
+}
+
+// Line by line.
+std::string for_terminal(std::string_view text)
+{
+    std::string result;
+    while (!text.empty()) {
+        const std::size_t end = std::min(text.find('\n'), text.size());
+        result += escaped(text.substr(0, end));
+        result += end < text.size() ? "\n" : "";
+        text.remove_prefix(std::min(end + 1, text.size()));
+    }
+    return result;
 }
 
 }  // namespace
@@ -39,24 +95,24 @@ std::string tool_failure::message() const
 tool_failure failure_of(const exc_t& exception, const std::string& about, const std::string& note)
 {
     const bool no_memory = dynamic_cast<const exc_not_enough_memory_t*>(&exception) != nullptr;
-    return {no_memory ? status_unusable : status_findings, from_operating_system(exception) ? about : "", 0,
-            exception.message().text(), note};
+    const int error = no_memory ? 0 : system_error_of(exception);
+    const bool from_system = error != 0 || no_memory || from_operating_system(exception);
+    return {from_system ? status_unusable : status_findings, from_system ? about : "", 0,
+            error != 0 ? std::strerror(error) : text_of(exception.message().text()), note};
 }
 
 std::string on_one_line(std::string_view text)
 {
-    std::string escaped;
-    const std::string_view shown = text.substr(0, message_limit);
-    bounded_text measure(nullptr, 0);
-    put_on_one_line(measure, shown);
-    escaped.resize(measure.finish() + 1);
-    bounded_text out(escaped.data(), escaped.size());
-    put_on_one_line(out, shown);
-    escaped.resize(out.finish());
-    if (shown.size() < text.size()) {
-        escaped += "... (" + std::to_string(text.size()) + " bytes)";
+    std::string line = escaped(text.substr(0, message_limit));
+    if (message_limit < text.size()) {
+        line += "... (" + std::to_string(text.size()) + " bytes)";
     }
-    return escaped;
+    return line;
+}
+
+std::string shown(std::string_view text)
+{
+    return writes_to_terminal() ? on_one_line(text) : std::string(text);
 }
 
 std::string shortened(std::string_view value)
@@ -108,6 +164,15 @@ json json_of_value(std::string_view value)
     return {{"base64", std::move(text)}};
 }
 
+json json_of_values(const std::vector<std::string>& values)
+{
+    json members = json::array();
+    for (const std::string& value : values) {
+        members.push_back(json_of_value(value));
+    }
+    return members;
+}
+
 void tell(std::string_view line)
 {
     const std::string text = on_one_line(line) + "\n";
@@ -117,15 +182,37 @@ void tell(std::string_view line)
 
 void write_result(std::string_view text)
 {
+    static bool has_failed = false;
+    std::string safe;
+    if (writes_to_terminal()) {
+        safe = for_terminal(text);
+        text = safe;
+    }
     errno = 0;
     if (std::fwrite(text.data(), 1, text.size(), stdout) != text.size() || std::fflush(stdout) != 0) {
-        throw tool_failure(status_unusable, "standard output", 0, std::strerror(errno));
+        const std::string words = std::strerror(errno);
+        throw output_failure(words, std::exchange(has_failed, true));
     }
 }
 
 void write_json(const json& value)
 {
     write_result(value.dump(2, ' ', false, json::error_handler_t::replace) + "\n");
+}
+
+json json_of(const tool_failure& failure)
+{
+    json error = {{"text", failure.what()}};
+    if (!failure.file().empty()) {
+        error["file"] = json_of_value(failure.file());
+    }
+    if (failure.line() > 0) {
+        error["line"] = failure.line();
+    }
+    if (!failure.note().empty()) {
+        error["note"] = failure.note();
+    }
+    return error;
 }
 
 message_collector::message_collector(int verbosity) : verbosity_(verbosity)

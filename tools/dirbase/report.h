@@ -1,7 +1,8 @@
 // What the tool says to its user: failures, warnings, results, and the exit statuses that go with them.
 //
-// Results go to standard output, everything else to standard error. Texts that come out of a schema may hold any byte
-// but 0; on standard error, and on a terminal, none of them moves a cursor or begins a new line.
+// Results go to standard output, everything else to standard error. Texts that come out of a schema, and values, may hold
+// any byte; on standard error, and on a terminal, none of them moves a cursor. Where a result has a line for each, none
+// of them begins a new line there.
 #pragma once
 
 #include <mutex>
@@ -24,7 +25,7 @@ using json = nlohmann::ordered_json;
 enum exit_status : int {
     status_yes = 0,
     status_findings = 1,  // the schema, or the change, is refused
-    status_unusable = 2,  // a wrong call, or input that can't be read
+    status_unusable = 2,  // a wrong call, input that can't be read, or the operating system fails
 };
 
 // Ends a command with a message: "FILE:LINE: TEXT", "FILE: TEXT" with line 0, or TEXT alone without a file.
@@ -51,9 +52,23 @@ private:
     std::string note_;
 };
 
-// The failure that an exception of the library means to the user: its text alone. A refusal by the operating system
-// has a text that doesn't name what it was about, so `about` goes in front of it. Memory that ran out is
-// status_unusable.
+// That standard output can't be written. Each further try fails too, which needn't be told again.
+class output_failure : public tool_failure {
+public:
+    output_failure(const std::string& text, bool repeated, std::string note = "")
+        : tool_failure(status_unusable, "standard output", 0, text, std::move(note)), repeated_(repeated)
+    {
+    }
+
+    bool is_repeated() const { return repeated_; }
+
+private:
+    bool repeated_;
+};
+
+// The failure that an exception of the library means to the user: its text alone. A failure of the operating system
+// has that system's words, which don't name what they are about: `about` goes in front of them. These, and memory that
+// ran out, are status_unusable.
 tool_failure failure_of(const exc_t& exception, const std::string& about = "", const std::string& note = "");
 
 inline std::string text_of(const csgl_string& text)
@@ -64,7 +79,10 @@ inline std::string text_of(const csgl_string& text)
 // A text with its control bytes escaped, cut when it is longer than anybody reads.
 std::string on_one_line(std::string_view text);
 
-// The same for a value in the midst of other words, of which the beginning is enough.
+// A text that has a line of standard output for itself: as it is for a file, and on one line for a terminal.
+std::string shown(std::string_view text);
+
+// The same as on_one_line for a value in the midst of other words, of which the beginning is enough.
 std::string shortened(std::string_view value);
 
 // Whether bytes are well-formed UTF-8.
@@ -72,15 +90,20 @@ bool is_utf8(std::string_view bytes);
 
 // A value as JSON: a text, or for bytes that are none {"base64": TEXT}.
 json json_of_value(std::string_view value);
+json json_of_values(const std::vector<std::string>& values);
 
 // Writes a line to standard error, made safe by on_one_line.
 void tell(std::string_view line);
 
-// Writes a result to standard output as it is. Raises tool_failure when it can't be written whole.
+// Writes a result to standard output: as it is, or to a terminal with all control bytes but line feeds escaped. Raises
+// output_failure when it can't be written whole.
 void write_result(std::string_view text);
 
-// Writes a JSON value and a line feed. Bytes that are no UTF-8 come out as U+FFFD.
+// Writes a JSON value and a line feed. In messages bytes that are no UTF-8 come out as U+FFFD; data has json_of_value.
 void write_json(const json& value);
+
+// A failure as the member "error" of an object.
+json json_of(const tool_failure& failure);
 
 // Takes the message log for its lifetime, of which there is one at a time, and keeps its lines from mixing with the
 // tool's.

@@ -109,8 +109,8 @@ private:
         const std::vector<std::string> after = texts_of(now);
         json& member = add(now, "changed", '-', before == after ? std::vector<std::string>() : before);
         add_texts('+', before == after ? std::vector<std::string>() : after);
-        member["before"] = before;
-        member["after"] = after;
+        member["before"] = json_of_values(before);
+        member["after"] = json_of_values(after);
         return member;
     }
 
@@ -121,7 +121,10 @@ private:
         const std::string name = text_of(definition.name());
         text_ += on_one_line(kind + " " + name + ": " + what) + "\n";
         add_texts(mark, texts);
-        members_.push_back({{"kind", kind}, {"name", name}, {"oid", text_of(definition.oid())}, {"difference", what}});
+        members_.push_back({{"kind", kind},
+                            {"name", json_of_value(name)},
+                            {"oid", json_of_value(text_of(definition.oid()))},
+                            {"difference", what}});
         return members_.back();
     }
 
@@ -151,13 +154,13 @@ private:
             const std::vector<std::string> from = sorted_names(was->superclasses());
             const std::vector<std::string> to = sorted_names(now->superclasses());
             effects.lines.push_back("superiors: " + joined(from) + " to " + joined(to));
-            effects.members["superclasses"] = {{"before", from}, {"after", to}};
+            effects.members["superclasses"] = {{"before", json_of_values(from)}, {"after", json_of_values(to)}};
         }
         json attributes = json::array();
         for (const auto& [oid, state] : attribute_changes(was)) {
             const std::string name = name_of(oid.c_str());
             effects.lines.push_back(std::string(state_words(state)) + ": " + name);
-            attributes.push_back({{"attribute", name}, {"change", state_words(state)}});
+            attributes.push_back({{"attribute", json_of_value(name)}, {"change", state_words(state)}});
         }
         effects.members["attributes"] = std::move(attributes);
         return effects;

@@ -117,7 +117,7 @@ bool schema_directory::lock(purpose why)
     }
     const int failure = take_lock(why == purpose::change ? LOCK_EX : LOCK_SH);
     if (failure != 0 && why == purpose::change) {
-        throw tool_failure(status_findings, list_, 0, std::string("can't be locked: ") + std::strerror(failure));
+        throw tool_failure(status_unusable, list_, 0, std::string("can't be locked: ") + std::strerror(failure));
     }
     return failure == 0;
 }
@@ -168,7 +168,7 @@ void schema_directory::recover(purpose why, bool locked)
             if (!only_reads) {
                 throw failure_of(failure, folder_);
             }
-            refusal = text_of(failure.message().text());
+            refusal = failure_of(failure).what();
             leftovers = ldcf_recovery(paths);  // some of the steps may have been taken
         }
     }

@@ -55,12 +55,12 @@ int list_attributes(const common_options& common, const std::string& word)
         }
     }
     if (common.as_json) {
-        write_json(json{{"ok", true}, {"property", word}, {"attributeTypes", names}});
+        write_json(json{{"ok", true}, {"property", word}, {"attributeTypes", json_of_values(names)}});
         return status_yes;
     }
     std::string text;
     for (const std::string& name : names) {
-        text.append(name).append("\n");
+        text.append(shown(name)).append("\n");
     }
     write_result(text);
     return status_yes;

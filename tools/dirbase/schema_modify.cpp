@@ -137,6 +137,17 @@ void prove_that_it_loads(const schema_directory& directory, const std::vector<st
         proof, [&changed](const std::string& path) { return changed.count(path) != 0 ? temporary_of(path) : path; });
 }
 
+// A new file would take the place of the link, and the file that it leads to stay as it was.
+void refuse_links(const std::vector<std::string>& paths)
+{
+    for (const std::string& path : paths) {
+        struct stat status = {};
+        if (::lstat(path.c_str(), &status) == 0 && S_ISLNK(status.st_mode)) {
+            throw tool_failure(status_unusable, path, 0, "a symbolic link; only a file itself can be changed");
+        }
+    }
+}
+
 // A new file takes the place of the old one, so it has to be given to the same owner and the same readers. Only the
 // superuser can give it to another owner; what else may go wrong leaves the file to the owner alone.
 void keep_permissions(const std::vector<std::string>& paths)
@@ -189,6 +200,7 @@ std::vector<std::string> run_phases(const schema_directory& directory, ldcf_modi
     try {
         run(nullptr, operation, ldcf_modify_vote, definition);
         std::vector<std::string> paths = modified_files(*ldcf_schema_proposed_g);
+        refuse_links(paths);
         prove_that_it_loads(directory, paths);
         keep_permissions(paths);
         run(nullptr, operation, ldcf_modify_commit, definition);
@@ -230,23 +242,27 @@ int modify(const common_options& common, const schema_directory& directory, ldcf
     const std::string kind = ldcf_kind_of(definition);
     const std::string name = text_of(definition.name());
     const std::string oid = text_of(definition.oid());
-    if (common.as_json) {
-        write_json(json{{"ok", true},
-                        {"done", done_word(operation)},
-                        {"kind", kind},
-                        {"oid", oid},
-                        {"name", name},
-                        {"changedFiles", changed},
-                        {"warnings", warnings}});
-        return status_yes;
-    }
     std::string text =
         on_one_line(done_word(operation) + (": " + kind) + " '" + name + "'" + (name == oid ? "" : " (" + oid + ")")) +
         "\n";
     for (const std::string& file : changed) {
         text += "changed: " + on_one_line(file) + "\n";
     }
-    write_result(text);
+    try {
+        if (common.as_json) {
+            write_json(json{{"ok", true},
+                            {"done", done_word(operation)},
+                            {"kind", kind},
+                            {"oid", json_of_value(oid)},
+                            {"name", json_of_value(name)},
+                            {"changedFiles", json_of_values(changed)},
+                            {"warnings", warnings}});
+        } else {
+            write_result(text);
+        }
+    } catch (const output_failure& failure) {
+        throw output_failure(failure.what(), false, "the change is made all the same");
+    }
     return status_yes;
 }
 
@@ -255,6 +271,9 @@ int modify(const common_options& common, const schema_directory& directory, ldcf
 int modify_schema(const common_options& common, const std::string& operation, const std::string& file,
                   message_collector& log)
 {
+    // Who reads the report may go ahead of its end. The change, and the exit status that tells of it, don't depend on
+    // that.
+    std::signal(SIGPIPE, SIG_IGN);
     any_definition definition = read_definition(file);  // ahead of the lock: it may come slowly
     const schema_directory directory(common.schema_folder, schema_directory::purpose::change);
     directory.load();

@@ -2,8 +2,6 @@
 //
 // What is printed without --kind is a schema file, in sections; a section's lines are what --kind prints. The
 // exception is the inherited form, which is no definition: line for line it says what the standard form leaves out.
-#include <unistd.h>
-
 #include "servers/vrnd/libdirbase/schema/ldcf_schema.h"
 #include "tools/dirbase/schema_commands.h"
 #include "tools/dirbase/schema_directory.h"
@@ -108,14 +106,13 @@ std::vector<printed_section> sections_of(const ldcf_schema& schema, print_form f
 // Into a file every byte goes as it is, so that it can be read back; a terminal gets no control bytes.
 std::string as_text(const std::vector<printed_section>& sections, bool with_keywords)
 {
-    const bool for_eyes = ::isatty(STDOUT_FILENO) != 0;
     std::string text;
     for (const printed_section& section : sections) {
         if (with_keywords) {
             text.append(text.empty() ? "" : "\n").append(section.keyword).append(" {\n");
         }
         for (const printed_definition& definition : section.definitions) {
-            text.append(for_eyes ? on_one_line(definition.text) : definition.text).append("\n");
+            text.append(shown(definition.text)).append("\n");
         }
         if (with_keywords) {
             text.append("}\n");
@@ -130,10 +127,10 @@ json as_json(const std::vector<printed_section>& sections)
     for (const printed_section& section : sections) {
         for (const printed_definition& definition : section.definitions) {
             definitions.push_back({{"kind", definition.kind},
-                                   {"oid", definition.oid},
-                                   {"name", definition.name},
+                                   {"oid", json_of_value(definition.oid)},
+                                   {"name", json_of_value(definition.name)},
                                    {"form", definition.form},
-                                   {"text", definition.text}});
+                                   {"text", json_of_value(definition.text)}});
         }
     }
     return json{{"ok", true}, {"definitions", std::move(definitions)}};

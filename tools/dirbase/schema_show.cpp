@@ -42,7 +42,8 @@ int show_definitions(const common_options& common, const std::vector<std::string
         for (const definition_sheet& sheet : sheets) {
             definitions.push_back(sheet.as_json());
         }
-        write_json(json{{"ok", unknown.empty()}, {"definitions", std::move(definitions)}, {"unknown", unknown}});
+        write_json(json{
+            {"ok", unknown.empty()}, {"definitions", std::move(definitions)}, {"unknown", json_of_values(unknown)}});
     } else {
         std::string text;
         for (const definition_sheet& sheet : sheets) {

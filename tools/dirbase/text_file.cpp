@@ -17,6 +17,7 @@ namespace dirbase_tool {
 namespace {
 
 constexpr std::size_t size_limit = std::size_t{1} << 30;
+constexpr std::size_t line_limit = std::size_t{1} << 20;
 constexpr std::size_t chunk_size = std::size_t{1} << 16;
 
 // An open file; standard input stays open behind it.
@@ -44,6 +45,61 @@ private:
 [[noreturn]] void throw_unusable(const std::string& path, const std::string& text)
 {
     throw tool_failure(status_unusable, source_name(path), 0, text);
+}
+
+// Reads on, and says how many bytes came: 0 at the end.
+std::size_t read_some(const input& file, const std::string& path, std::vector<char>& chunk)
+{
+    for (;;) {
+        const ssize_t got = ::read(file.handle(), chunk.data(), chunk.size());
+        if (got >= 0) {
+            return static_cast<std::size_t>(got);
+        }
+        if (errno != EINTR) {
+            throw_unusable(path, std::strerror(errno));
+        }
+    }
+}
+
+void check_line(const std::string& line, int number)
+{
+    const bool is_long = line.size() > line_limit;
+    if (is_long || line.find('\0') != std::string::npos) {
+        throw tool_failure(status_unusable, source_name(standard_input), number,
+                           is_long ? "longer than 1 MiB" : "holds a byte 0");
+    }
+}
+
+// Hands over the lines of standard input; the last one may lack its end.
+void for_each_line(const std::function<void(const std::string&)>& take, const std::function<void()>& before_reading)
+{
+    const input file(standard_input);
+    std::vector<char> chunk(chunk_size);
+    std::string text;  // what has been read and not handed over
+    std::string line;
+    int number = 1;
+    for (;;) {
+        before_reading();
+        const std::size_t searched = text.size();
+        const std::size_t got = read_some(file, standard_input, chunk);
+        text.append(chunk.data(), got);
+        std::size_t begin = 0;
+        for (std::size_t end = text.find('\n', searched); end != std::string::npos; end = text.find('\n', begin)) {
+            line.assign(text, begin, end - begin);
+            line.resize(line.size() - (line.ends_with('\r') ? 1 : 0));
+            check_line(line, number++);
+            take(line);
+            begin = end + 1;
+        }
+        text.erase(0, begin);
+        if (!text.empty() && (got == 0 || text.size() > line_limit)) {
+            check_line(text, number);
+            take(text);
+        }
+        if (got == 0) {
+            return;
+        }
+    }
 }
 
 }  // namespace
@@ -77,17 +133,10 @@ std::string read_text(const std::string& path, text_source allowed)
     }
     std::vector<char> chunk(chunk_size);
     for (;;) {
-        const ssize_t got = ::read(file.handle(), chunk.data(), chunk.size());
-        if (got < 0 && errno == EINTR) {
-            continue;
-        }
-        if (got < 0) {
-            throw_unusable(path, std::strerror(errno));
-        }
-        if (got == 0) {
+        const std::size_t size = read_some(file, path, chunk);
+        if (size == 0) {
             return text;
         }
-        const auto size = static_cast<std::size_t>(got);
         if (const void* zero = std::memchr(chunk.data(), 0, size); zero != nullptr) {
             const auto at = static_cast<std::size_t>(static_cast<const char*>(zero) - chunk.data());
             throw_unusable(path, "a binary file: byte " + std::to_string(text.size() + at + 1) + " is NUL");
@@ -99,22 +148,17 @@ std::string read_text(const std::string& path, text_source allowed)
     }
 }
 
-std::vector<std::string> with_lines_of_input(const std::vector<std::string>& arguments)
+void for_each_line_or_argument(const std::vector<std::string>& arguments,
+                               const std::function<void(const std::string&)>& take,
+                               const std::function<void()>& before_reading)
 {
-    std::vector<std::string> texts;
     for (const std::string& argument : arguments) {
-        if (argument != standard_input) {
-            texts.push_back(argument);
-            continue;
-        }
-        const std::string text = read_text(argument, text_source::any);
-        for (std::size_t begin = 0; begin < text.size();) {
-            const std::size_t end = std::min(text.find('\n', begin), text.size());
-            texts.push_back(text.substr(begin, end - begin));
-            begin = end + 1;
+        if (argument == standard_input) {
+            for_each_line(take, before_reading);
+        } else {
+            take(argument);
         }
     }
-    return texts;
 }
 
 }  // namespace dirbase_tool

@@ -11,6 +11,7 @@
 #include "servers/vrnd/libdirbase/model/timestamp.h"
 #include "servers/vrnd/libdirbase/model/value_normalize.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_api.h"
+#include "tools/dirbase/answers.h"
 #include "tools/dirbase/data_commands.h"
 #include "tools/dirbase/schema_directory.h"
 
@@ -77,33 +78,60 @@ int normal_form(const std::string& value, std::uint32_t code, std::string& form)
     return result;
 }
 
+refusal_words refusal(const std::string& value, std::uint32_t code, int result)
+{
+    refusal_words why = {.result = result};
+    if ((code & SC_DN) != 0) {
+        const refusal_words of_dn = why_dn_is_refused(value);
+        return of_dn.result == result ? of_dn : why;
+    }
+    if (const char* const fault = fault_of_syntax(code); fault != nullptr) {
+        why.words = std::string("the value ") + fault;
+    }
+    return why;
+}
+
+answer normalize(const std::string& value, std::uint32_t code)
+{
+    std::string form;
+    const int result = normal_form(value, code, form);
+    if (result == LDAP_NO_MEMORY) {
+        throw std::bad_alloc();
+    }
+    const bool is_good = result == LDAP_SUCCESS;
+    answer given = {is_good, shown(form) + "\n", {{"value", json_of_value(value)}, {"ok", is_good}}};
+    if (is_good) {
+        given.member["normal"] = json_of_value(form);
+    } else {
+        const refusal_words why = refusal(value, code, result);
+        given.text = "refused    " + why.text() + "\n";
+        given.member.update(why.as_json());
+    }
+    return given;
+}
+
 }  // namespace
+
+const char* fault_of_syntax(std::uint32_t syntax)
+{
+    switch (syntax) {
+    case SC_INT: return "is no integer from -2147483648 to 2147483647";
+    case SC_BOOL: return "is neither TRUE nor FALSE";
+    case SC_GT: return "is no time of the form YYYYMMDDHHMMSS[.F](Z|+HHMM|-HHMM)";
+    case SC_UTCT: return "is no time of the form YYMMDDHHMM[SS](Z|+HHMM|-HHMM)";
+    case SC_CIS | SC_BIT_STRING: return "is no bit string of the form '0101'B";
+    case SC_CIS | SC_NUMERIC_STRING: return "is no numeric string: digits without spaces between them";
+    case SC_CIS | SC_COUNTRY_STRING: return "is no country code of two letters";
+    default: return nullptr;
+    }
+}
 
 int normalize_values(const common_options& common, const std::string& syntax, const std::vector<std::string>& values)
 {
     load_for_names(common.schema_folder);
     const std::uint32_t code = find_syntax(syntax);
-    bool refused = false;
-    json members = json::array();
-    std::string text;
-    for (const std::string& value : values) {
-        std::string form;
-        const int result = normal_form(value, code, form);
-        if (result == LDAP_SUCCESS) {
-            text += form + "\n";
-            members.push_back({{"value", value}, {"ok", true}, {"normal", form}});
-        } else {
-            refused = true;
-            text += "refused    " + result_words(result) + "\n";
-            members.push_back({{"value", value}, {"ok", false}, {"result", result}, {"name", result_words(result)}});
-        }
-    }
-    if (common.as_json) {
-        write_json(json{{"ok", !refused}, {"values", std::move(members)}});
-    } else {
-        write_result(text);
-    }
-    return refused ? status_findings : status_yes;
+    return answer_each(common, {.list = "values", .takes_lines = false}, values,
+                       [code](const std::string& value) { return normalize(value, code); });
 }
 
 }  // namespace dirbase_tool

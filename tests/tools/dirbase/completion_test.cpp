@@ -22,8 +22,8 @@ using tool_test::run_settings;
 using tool_test::run_tool;
 using tool_test::schema_copy;
 using tool_test::tool_run;
+using tool_test::words;
 
-using words = std::vector<std::string>;
 using word_set = std::set<std::string>;
 
 // Sources the completion, and calls the function that it registered on the words behind the path of the tool, with the

@@ -16,20 +16,18 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::Not;
 using testing::StartsWith;
+using tool_test::joined;
 using tool_test::lines_of;
 using tool_test::run_tool;
 using tool_test::tool_run;
-
-using words = std::vector<std::string>;
+using tool_test::words;
 
 namespace {
 
 // Filters by standard input, which has no limit as arguments have.
 tool_run parse_lines(const std::string& lines, const words& options = {})
 {
-    words call = {"filter", "parse", "-"};
-    call.insert(call.end(), options.begin(), options.end());
-    return run_tool(call, {.input = lines});
+    return run_tool(joined({"filter", "parse", "-"}, options), {.input = lines});
 }
 
 // A filter's text at random, and what a server should make of it, by the plainest means.
@@ -140,6 +138,20 @@ TEST(FilterParse, DefinedFiltersHaveACanonicalTextAndATree)
         {"(telephoneNumber=+1 555-01)", "(telephonenumber=+155501)\n  equality telephonenumber = +155501\n"},
         {"(title;lang-de=a)", "(title;lang-de=A)\n  equality title;lang-de = A\n"},
         {"(debug=x)", "(debug=x)\n  equality debug = x\n"},
+        // Values that aren't of their syntax are compared as well as they can.
+        {"(uidNumber>=x)",
+         "(uidnumber>=x)\n  greater or equal uidnumber >= x (the value is no integer from -2147483648 to 2147483647; it "
+         "counts as the number that it begins with, or 0)\n"},
+        {"(pwdReset=maybe)",
+         "(pwdreset=maybe)\n  equality pwdreset = maybe (the value is neither TRUE nor FALSE; no proper value equals "
+         "it)\n"},
+        {"(createTimestamp<=2024)",
+         "(createtimestamp<=2024)\n  less or equal createtimestamp <= 2024 (the value is no time of the form "
+         "YYYYMMDDHHMMSS[.F](Z|+HHMM|-HHMM); every proper time counts as the greater one)\n"},
+        // Texts that the parser takes more than the grammar has.
+        {"(cn=a\\zz)", "(cn=A\\5cZZ)\n  equality cn = A\\ZZ\n"},
+        {"(cn=a\\2)", "(cn=A\\02)\n  equality cn = A\\x02\n"},
+        {"cn=a)", "(cn=A\\29)\n  equality cn = A)\n"},
         {"(&(cn=a) (|(!(sn=b))(nonesuch=c)) )",
          "(&(cn=A)(|(!(sn=B))))\n  and\n    equality cn = A\n    or\n      not\n        equality sn = B\n"
          "      undefined: equality nonesuch = c (the schema has no attribute \"nonesuch\")\n"},
@@ -297,9 +309,7 @@ TEST(FilterParse, BytesOfAnyKindGetAnAnswerAndReachNoTerminalAsTheyAre)
 TEST(FilterParse, EachFilterHasItsAnswerInOrderAndAsJson)
 {
     const words filters = {"(cn=a*)", "(|(jpegPhoto=\\00\\ff)(nonesuch=b))", "(cn=**)", "(x"};
-    words call = {"filter", "parse", "--json"};
-    call.insert(call.end(), filters.begin(), filters.end());
-    const tool_run run = run_tool(call);
+    const tool_run run = run_tool(joined({"filter", "parse", "--json"}, filters));
     EXPECT_EQ(run.status, 1);
     const auto shown = nlohmann::json::parse(run.out);
     EXPECT_EQ(shown["ok"], false);
@@ -318,7 +328,7 @@ TEST(FilterParse, EachFilterHasItsAnswerInOrderAndAsJson)
     EXPECT_THAT(shown["filters"][2]["tree"]["refused"].get<std::string>(), StartsWith("21 "));
     EXPECT_EQ(shown["filters"][3]["verdict"], "no filter");
     EXPECT_EQ(shown["filters"][3]["error"]["offset"], 0);
-    const tool_run text = run_tool({"filter", "parse", "-", "(sn=c)"}, {.input = "(cn=a)\n(cn=b)\n"});
+    const tool_run text = run_tool({"filter", "parse", "-", "(sn=c)"}, {.input = "cn=a\r\n(cn=b)\n"});
     EXPECT_EQ(text.out, "(cn=A)\n  equality cn = A\n\n(cn=B)\n  equality cn = B\n\n(sn=C)\n  equality sn = C\n");
     EXPECT_EQ(run_tool({"filter", "parse"}).status, 2);
 }

@@ -3,7 +3,6 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
-#include <fstream>
 #include <map>
 #include <nlohmann/json.hpp>
 #include <random>
@@ -11,18 +10,19 @@
 
 #include "tests/tools/dirbase/run_tool.h"
 
+using test_support::file_text;
 using test_support::temp_dir;
 using testing::AllOf;
 using testing::ContainsRegex;
 using testing::HasSubstr;
 using testing::Not;
 using testing::StartsWith;
+using tool_test::joined;
 using tool_test::lines_of;
 using tool_test::run_settings;
 using tool_test::run_tool;
 using tool_test::tool_run;
-
-using words = std::vector<std::string>;
+using tool_test::words;
 
 namespace {
 
@@ -30,9 +30,7 @@ const std::string samples = std::string(DIRBASE_SOURCE_SCHEMA_DIR) + "/../sample
 
 tool_run check(const std::string& text, const words& options = {})
 {
-    words call = {"ldif", "check", "-"};
-    call.insert(call.end(), options.begin(), options.end());
-    return run_tool(call, {.input = text});
+    return run_tool(joined({"ldif", "check", "-"}, options), {.input = text});
 }
 
 // "LINE KIND SUBJECT" of each fault.
@@ -45,12 +43,6 @@ words faults_of(const std::string& json_text)
         faults.push_back(fault.contains("subject") ? text + " " + fault["subject"].get<std::string>() : text);
     }
     return faults;
-}
-
-std::string content_of(const std::string& path)
-{
-    std::ifstream in(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
 }
 
 const std::string device = "objectClass: top\nobjectClass: device\n";
@@ -85,18 +77,16 @@ TEST(LdifCheck, TheSampleOrganisationPassesWhole)
 {
     const std::string file = samples + "organisation.ldif";
     for (const words& more : {words{}, {"--threads", "1"}, {"--mode", "3"}, {"--policy"}}) {
-        words call = {"ldif", "check", file};
-        call.insert(call.end(), more.begin(), more.end());
-        const tool_run run = run_tool(call);
+        const tool_run run = run_tool(joined({"ldif", "check", file}, more));
         EXPECT_EQ(run.status, 0) << run.err;
         EXPECT_EQ(run.out, "358 entries, 358 accepted, 0 refused\n");
     }
-    EXPECT_EQ(check(content_of(file)).status, 0);
+    EXPECT_EQ(check(file_text(file)).status, 0);
 }
 
 TEST(LdifCheck, EachSampleFaultIsFoundAsItsCommentNamesIt)
 {
-    const std::string text = content_of(samples + "faults.ldif");
+    const std::string text = file_text(samples + "faults.ldif");
     words named;
     const std::regex comment("\n# fault: (\\S+)");
     for (std::sregex_iterator at(text.begin(), text.end(), comment), end; at != end; ++at) {
@@ -119,6 +109,8 @@ TEST(LdifCheck, FaultsHaveTheirLineAndSubjectAndWhatIsNoneHasNot)
     const temp_dir dir;
     const std::string url = "file://" + dir.write("in%20it", "value of a file\n");
     const std::string escaped = std::regex_replace(url, std::regex("%"), "%25");
+    const std::string mark = "\xEF\xBB\xBF";
+    const std::string large = "seeAlso:< file://" + dir.write("large", std::string(6 << 20, 'x')) + "\n";
     const struct {
         std::string text;
         words faults;
@@ -135,6 +127,15 @@ TEST(LdifCheck, FaultsHaveTheirLineAndSubjectAndWhatIsNoneHasNot)
         {"dn: cn=a\n" + device + "description:< " + escaped + "\n", {}},
         {"dn: cn=a\n" + device + "description:< " + escaped + "x\ndescription:< file:///\n",
          {"4 bad-url description", "5 bad-url description"}},
+        {"dn: cn=a\n" + device + large + large + large + "\ndn: cn=b\n" + device + large + large,
+         {"6 bad-url seeAlso", "4 bad-dn-value seeAlso", "5 bad-dn-value seeAlso", "11 bad-dn-value seeAlso",
+          "12 bad-dn-value seeAlso"}},  // an entry has room for two
+        {"dn: cn=a\n" + device + "description:<   " + escaped + "\ndescription::   dA==\ndescription:  t\n",
+         {}},  // of a plain value one space is taken
+        {"dn: cn=a\n" + any + "uidNumber: 7\x01\nuidNumber:7\nho\x01st: x\nxyz :y\n:z\n",
+         {"5 bad-value uidNumber", "7 bad-type ho\x01st", "8 undefined-attribute xyz", "9 bad-type"}},
+        {mark + "dn: cn=a\n" + device + "\n" + mark + "dn: cn=b\n",
+         {"5 no-dn", "5 bad-type " + mark + "dn"}},  // it is one at the begin alone
         {"dn: cn=a\n" + device + "description\n", {"4 no-colon"}},
         {"dn: cn=a\n" + device + "description;x: y\njpegPhoto;binary:: AA==\n",
          {"4 bad-option description;x", "5 not-allowed jpegPhoto"}},
@@ -293,6 +294,66 @@ TEST(LdifCheck, WhatIsNoLdifAtAllIsRefusedInFewWords)
     const tool_run run = check(noise);
     EXPECT_EQ(run.status, 1);
     EXPECT_THAT(run.out, AllOf(HasSubstr("more faults in this entry"), Not(ContainsRegex("[\x01-\x09\x0b-\x1f]"))));
+}
+
+TEST(LdifCheck, LongNamesInFaultsAreCut)
+{
+    const std::string huge(100'000, 'x');
+    std::string text = "dn: cn=" + huge + "\n" + huge + "!: y\n";
+    for (int i = 0; i < 30; ++i) {
+        text += "x\n";
+    }
+    const tool_run run = check(text, {"--json"});
+    EXPECT_EQ(run.status, 1);
+    EXPECT_LT(run.out.size(), 22 * 16'500u) << "20 faults with a DN, and one subject";
+    const auto shown = nlohmann::json::parse(run.out);
+    EXPECT_EQ(shown["faults"].size(), 20u);
+    EXPECT_EQ(shown["kinds"]["no-colon"], 30);
+    for (const auto& fault : shown["faults"]) {
+        const std::string dn = fault["dn"];
+        EXPECT_TRUE(dn == "cn=" + std::string(16'381, 'x') + "... (100003 bytes)") << dn.size();
+    }
+}
+
+TEST(LdifCheck, AFailureHalfWayEndsTheOutputProperly)
+{
+#if defined(__SANITIZE_THREAD__) || defined(__SANITIZE_ADDRESS__)
+    GTEST_SKIP() << "the sanitizer needs the memory itself";
+#endif
+    const temp_dir dir;
+    std::string lines = "dn: cn=b\n";
+    while (lines.size() < 15'000'000) {
+        lines += "l: " + std::to_string(lines.size()) + "\n";
+    }
+    const std::string many = dir.write("many", "dn: cn=a\nl: 1\nl: 1\n\n" + lines);
+    const std::string other = dir.write("other", "dn: cn=c\n");
+    const words little_memory = {"prlimit", "--data=" + std::to_string(std::size_t{100} << 20)};
+    const words endless_stacks = {"prlimit", "--stack=" + std::to_string(std::size_t{1} << 47)};
+    const struct {
+        words call;
+        words in_front;
+        const char* text;
+        std::size_t results;  // what came before
+        const char* member;
+    } cases[] = {
+        {{"check", "--threads", "1", many}, little_memory, "not enough memory", 2, "faults"},
+        {{"check", "--threads", "2", many}, little_memory, "not enough memory", 2, "faults"},
+        {{"check", "--threads", "2", many}, endless_stacks, "can't start a thread: ", 0, "faults"},
+        {{"search", "--threads", "2", many, "(l=*)"}, little_memory, "not enough memory", 1, "entries"},
+        {{"search", "--threads", "2", many, "(l=*)"}, endless_stacks, "can't start a thread: ", 0, "entries"},
+        {{"print", many}, little_memory, "not enough memory", 1, "entries"},
+    };
+    for (const auto& c : cases) {
+        const tool_run run = run_tool(joined({"ldif"}, joined(c.call, {"--json"})), {.in_front = c.in_front});
+        EXPECT_EQ(run.status, 2) << c.call[0] << c.text;
+        EXPECT_THAT(run.err, HasSubstr(c.text)) << c.call[0];
+        const auto shown = nlohmann::json::parse(run.out, nullptr, false);
+        ASSERT_TRUE(shown.is_object()) << c.call[0] << c.text << run.out.substr(0, 1000);
+        EXPECT_EQ(shown["ok"], false);
+        EXPECT_THAT(shown["error"]["text"], StartsWith(c.text));
+        EXPECT_EQ(shown[c.member].size(), c.results) << c.call[0] << c.text;
+        EXPECT_EQ(run_tool(joined({"ldif"}, c.call), {.in_front = c.in_front}).status, 2);
+    }
 }
 
 TEST(LdifCheck, WhatCannotBeReadOrWrittenGivesTwo)

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <filesystem>
 #include <map>
 #include <nlohmann/json.hpp>
 #include <random>
@@ -13,8 +14,13 @@
 
 using test_support::temp_dir;
 using testing::HasSubstr;
+using testing::StartsWith;
+using tool_test::joined;
+using tool_test::lines_of;
+using tool_test::run_settings;
 using tool_test::run_tool;
 using tool_test::tool_run;
+using tool_test::words;
 
 namespace {
 
@@ -177,6 +183,50 @@ TEST(LdifPrint, EntriesThatCannotBeReadAreLeftOutAndTold)
               "standard input:2: o=a: no \":\" in \"x\"; the entry is left out\n"
               "standard input:6: x=c: dn: 17 undefinedAttributeType at byte 0: the schema has no such attribute "
               "type; the entry is left out\n");
+    std::string many = "dn: o=a\n\ndn: o=b\n";
+    for (int i = 0; i < 25; ++i) {
+        many += "x\n";
+    }
+    for (const words& call : {words{"print", "-"}, {"search", "-", "(o=*)"}, {"diff", "-", "/dev/null"}}) {
+        const tool_run told = run_tool(joined({"ldif"}, call), {.input = many});
+        EXPECT_THAT(told.err, HasSubstr("standard input:3: and 5 more faults in this entry\n")) << call[0];
+        EXPECT_EQ(lines_of(told.err).size(), call[0] == "diff" ? 22u : 21u) << told.err;
+        const std::string large = many.substr(0, 9) + "dn: o=c\no: " + std::string(17'000'000, 'x') + "\n";
+        EXPECT_THAT(run_tool(joined({"ldif"}, call), {.input = large}).err,
+                    StartsWith("standard input:3: o=c: an entry of 17000012 bytes, more than 16777216"))
+            << call[0];
+    }
+}
+
+TEST(LdifPrint, FilesThatManyEntriesNameAreHeldOneAfterTheOther)
+{
+    const temp_dir dir;
+    const std::string value(1'000'000, 'x');
+    const std::string url = "file://" + dir.write("value", value);
+    std::string text;
+    constexpr std::size_t count = 100;
+    for (std::size_t i = 0; i < count; ++i) {
+        text += "dn: o=" + std::to_string(i) + "\no:< " + url + "\n\n";
+    }
+    const std::string file = dir.write("in", text);
+    run_settings settings = {.output_path = dir.write("out", "")};
+#if !defined(__SANITIZE_THREAD__) && !defined(__SANITIZE_ADDRESS__)
+    settings.in_front = {"prlimit", "--data=" + std::to_string(std::size_t{60} << 20)};
+#endif
+    for (const words& call : {words{"print", file},
+                              {"search", "--threads", "1", file, "(o=*)"},
+                              {"search", "--threads", "3", file, "(o=*)"}}) {
+        std::filesystem::resize_file(settings.output_path, 0);
+        const tool_run run = run_tool(joined({"ldif"}, call), settings);
+        EXPECT_EQ(run.status, 0) << run.err;
+        const std::string out = dir.read("out");
+        std::size_t at = 0;
+        std::size_t i = 0;
+        for (; i < count && at != std::string::npos; ++i) {
+            at = out.find("dn: o=" + std::to_string(i) + "\no: x", at);
+        }
+        EXPECT_TRUE(at != std::string::npos && out.size() > count * value.size()) << call[0] << i;
+    }
 }
 
 TEST(LdifDiff, ChangesAreAsSmallAsTheSyntaxAllows)
@@ -195,6 +245,13 @@ TEST(LdifDiff, ChangesAreAsSmallAsTheSyntaxAllows)
         {"sn: a", "sn: a\nsn: b\nsn;lang-de: c", "add: sn\nsn: b\n-\nadd: sn;lang-de\nsn;lang-de: c\n-\n"},
         {"sn: a\nsn;lang-de: b", "", "delete: sn\n-\ndelete: sn;lang-de\n-\n"},
         {"uidNumber: 7", "uidNumber: 8", "replace: uidNumber\nuidNumber: 8\n-\n"},  // it takes one value
+        {"uidNumber: x1", "uidNumber: x2", "replace: uidNumber\nuidNumber: x2\n-\n"},
+        // What isn't of its syntax is compared byte for byte; the rest of its attribute isn't.
+        {"member: x1\nmember: cn=A\nmember: x2\nmember: cn=b", "member: CN=a\nmember: x3\nmember: cn=B\nmember: x1",
+         "delete: member\nmember: x2\n-\nadd: member\nmember: x3\n-\n"},
+        {"", "member: x\nmember: cn=a\nmember: x\nmember: CN=A", "add: member\nmember: cn=a\nmember: x\n-\n"},
+        {"jpegPhoto;binary: a\njpegPhoto;binary: a", "audio;binary: a\njpegPhoto;binary: a\naudio;binary: a",
+         "add: audio;binary\naudio;binary: a\n-\n"},
         {"jpegPhoto: a\njpegPhoto: b\njpegPhoto: c", "jpegPhoto: a\njpegPhoto: b",
          "replace: jpegPhoto\njpegPhoto: a\njpegPhoto: b\n-\n"},  // no rule by which one is found
     };

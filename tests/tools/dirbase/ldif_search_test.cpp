@@ -15,6 +15,7 @@
 
 #include "tests/tools/dirbase/run_tool.h"
 
+using test_support::file_text;
 using test_support::temp_dir;
 using testing::AllOf;
 using testing::ContainsRegex;
@@ -22,12 +23,12 @@ using testing::EndsWith;
 using testing::HasSubstr;
 using testing::Not;
 using testing::StartsWith;
+using tool_test::joined;
 using tool_test::lines_of;
 using tool_test::run_settings;
 using tool_test::run_tool;
 using tool_test::tool_run;
-
-using words = std::vector<std::string>;
+using tool_test::words;
 
 namespace {
 
@@ -35,20 +36,12 @@ const std::string sample = std::string(DIRBASE_SOURCE_SCHEMA_DIR) + "/../sample/
 
 tool_run search(const std::string& file, const words& arguments, const run_settings& settings = {})
 {
-    words call = {"ldif", "search", file};
-    call.insert(call.end(), arguments.begin(), arguments.end());
-    return run_tool(call, settings);
+    return run_tool(joined({"ldif", "search", file}, arguments), settings);
 }
 
 tool_run search_text(const std::string& text, const words& arguments)
 {
     return search("-", arguments, {.input = text});
-}
-
-std::string content_of(const std::string& path)
-{
-    std::ifstream in(path, std::ios::binary);
-    return {std::istreambuf_iterator<char>(in), std::istreambuf_iterator<char>()};
 }
 
 std::string folded_case(std::string text)
@@ -199,7 +192,7 @@ TEST(LdifSearch, WhatMatchesInTheSampleIsWhatAPlainScanFinds)
         {"(title;lang-de=*)", [](const entry& e) { return e.has("title;lang-de"); }},
         {"(&(sn=a)(jpegPhoto=x))", [](const entry&) { return false; }},
     };
-    const std::vector<plain_entry> entries = plain_entries(content_of(sample));
+    const std::vector<plain_entry> entries = plain_entries(file_text(sample));
     ASSERT_EQ(entries.size(), 358u);
     for (const auto& c : cases) {
         words expected;
@@ -220,7 +213,7 @@ TEST(LdifSearch, WhatMatchesInTheSampleIsWhatAPlainScanFinds)
 
 TEST(LdifSearch, ScopesAreThoseOfASearchRequest)
 {
-    const std::vector<plain_entry> entries = plain_entries(content_of(sample));
+    const std::vector<plain_entry> entries = plain_entries(file_text(sample));
     for (const char* base : {"ou=people,o=quillhaven works", "o=quillhaven works", "", "ou=nobody,o=quillhaven works",
                              "uid=lotteryard,ou=people,o=quillhaven works"}) {
         std::map<std::string, words> expected;
@@ -450,7 +443,8 @@ TEST(LdifSearch, InputOfAnySizeGetsAnAnswerInLittleMemory)
         const char* told;
         const char* count;
     } cases[] = {
-        {"dn: cn=b\ncn: " + std::string(100'000'000, 'x'), "huge:3: cn=b: an entry of more than 16 MiB", "1\n"},
+        {"dn: cn=b\ncn: " + std::string(100'000'000, 'x'),
+         "huge:3: cn=b: an entry of 100000015 bytes, more than 16777216", "1\n"},
         {std::string(50'000'000, '\n') + "x", "huge:50000003: no \":\" in \"x\"", "1\n"},
         {"dn: cn=b\ncn: " + std::string(16'000'000, 'x'), "", "2\n"},
         {tags, "huge:3: cn=m: more than 10000 attributes", "1\n"},

@@ -12,23 +12,28 @@ namespace fs = std::filesystem;
 
 namespace tool_test {
 
-tool_run run_tool(const std::vector<std::string>& arguments, const run_settings& settings)
+words joined(words front, const words& more)
+{
+    front.insert(front.end(), more.begin(), more.end());
+    return front;
+}
+
+tool_run run_tool(const words& arguments, const run_settings& settings)
 {
     const test_support::temp_dir streams;
     const std::string in = streams.write("in", settings.input);
     const std::string out = settings.output_path.empty() ? streams.write("out", "") : settings.output_path;
     const std::string err = streams.write("err", "");
 
-    std::vector<std::string> words = {"env", "-u", "DIRBASE_SCHEMA"};
+    words call = {"env", "-u", "DIRBASE_SCHEMA"};
     if (!settings.schema_variable.empty()) {
-        words.push_back("DIRBASE_SCHEMA=" + settings.schema_variable);
+        call.push_back("DIRBASE_SCHEMA=" + settings.schema_variable);
     }
-    words.insert(words.end(), settings.in_front.begin(), settings.in_front.end());
-    words.emplace_back(DIRBASE_TOOL);
-    words.insert(words.end(), arguments.begin(), arguments.end());
+    call = joined(joined(call, settings.in_front), {DIRBASE_TOOL});
+    call = joined(call, arguments);
 
     std::vector<char*> pointers;
-    for (std::string& word : words) {
+    for (std::string& word : call) {
         pointers.push_back(word.data());
     }
     pointers.push_back(nullptr);
@@ -69,15 +74,12 @@ folder_contents schema_copy::contents() const
     return contents;
 }
 
-tool_run schema_copy::run(const std::string& command, const std::vector<std::string>& arguments,
-                          const run_settings& settings) const
+tool_run schema_copy::run(const std::string& command, const words& arguments, const run_settings& settings) const
 {
-    std::vector<std::string> words = {"schema", command, "--schema", folder()};
-    words.insert(words.end(), arguments.begin(), arguments.end());
-    return run_tool(words, settings);
+    return run_tool(joined({"schema", command, "--schema", folder()}, arguments), settings);
 }
 
-std::vector<std::string> as_common_user(const schema_copy& schema)
+words as_common_user(const schema_copy& schema)
 {
     if (geteuid() != 0) {
         return {};

@@ -23,8 +23,13 @@ struct run_settings {
     std::vector<std::string> in_front = {};  // a program and its arguments that run the tool
 };
 
+using words = std::vector<std::string>;
+
+// The words of a call with more of them behind.
+words joined(words front, const words& more);
+
 // Runs the tool with these arguments and waits for it. All else of the environment is the test's own.
-tool_run run_tool(const std::vector<std::string>& arguments, const run_settings& settings = {});
+tool_run run_tool(const words& arguments, const run_settings& settings = {});
 
 // The name and content of every file of a folder.
 using folder_contents = std::map<std::string, std::string>;
@@ -47,8 +52,7 @@ public:
     std::string path(const std::string& name) const { return dir_.path(name); }
 
     // dirbase schema COMMAND --schema FOLDER ARGUMENTS
-    tool_run run(const std::string& command, const std::vector<std::string>& arguments = {},
-                 const run_settings& settings = {}) const;
+    tool_run run(const std::string& command, const words& arguments = {}, const run_settings& settings = {}) const;
 
 private:
     test_support::temp_dir dir_;
@@ -56,7 +60,7 @@ private:
 
 // What to put in front of the tool so that permissions count: nothing, or for the superuser a program that runs it as
 // somebody else, who is let into the folder of the schema.
-std::vector<std::string> as_common_user(const schema_copy& schema);
+words as_common_user(const schema_copy& schema);
 
 // A schema directory whose only file has this text.
 class single_file_schema {

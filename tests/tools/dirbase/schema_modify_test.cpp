@@ -170,8 +170,39 @@ TEST_F(SchemaModify, AFolderThatCannotBeWrittenIsLeftAlone)
         GTEST_SKIP() << "nobody but the superuser can run the tool here";
     }
     fs::permissions(schema.folder(), fs::perms(0555));
-    EXPECT_EQ(refused("add", 1, settings), schema.folder() + ": permission_denied (EACCES)\n");
+    EXPECT_EQ(refused("add", 2, settings), schema.folder() + ": Permission denied\n");
     fs::permissions(schema.folder(), fs::perms(0755));
+}
+
+TEST_F(SchemaModify, ASymbolicLinkIsNotReplaced)
+{
+    const std::string elsewhere = schema.write("elsewhere", "");
+    const std::string file = schema.folder() + "/V3.additions";
+    fs::remove(file);
+    fs::create_symlink(elsewhere, file);
+    EXPECT_EQ(refused("add", 2, {.input = badge}), file + ": a symbolic link; only a file itself can be changed\n");
+    EXPECT_TRUE(fs::is_symlink(file));
+    EXPECT_EQ(modify("replace", "attributeTypes: ( 2.5.4.41 NAME 'name' SYNTAX 1.3.6.1.4.1.1466.115.121.1.15 )").status,
+              0);  // another file
+}
+
+// The status tells of the change, whoever reads the report or not.
+TEST_F(SchemaModify, AReportThatNobodyReadsIsToldBehindTheChange)
+{
+    int ends[2] = {};
+    ASSERT_EQ(pipe(ends), 0);
+    ASSERT_LT(ends[1], 10);
+    close(ends[0]);
+    const std::string file = schema.write("badge", badge);
+    for (const tool_test::words& call : {tool_test::words{"add", file}, {"delete", file, "--json"}}) {
+        const folder_contents before = schema.contents();
+        const std::string into_pipe = "exec \"$0\" \"$@\" >&" + std::to_string(ends[1]);
+        const tool_run run = schema.run("modify", call, {.in_front = {"sh", "-c", into_pipe}});
+        EXPECT_EQ(run.status, 2);
+        EXPECT_EQ(run.err, "standard output: Broken pipe\nnote: the change is made all the same\n");
+        EXPECT_FALSE(before == schema.contents());
+    }
+    close(ends[1]);
 }
 
 TEST_F(SchemaModify, RunsAtTheSameTimeLoseNothing)

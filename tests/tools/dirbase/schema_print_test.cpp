@@ -39,6 +39,29 @@ std::string section(const std::string& file, const std::string& keyword)
     return file.substr(start, file.find("\n}\n", start) + 1 - start);
 }
 
+// What a text in JSON stands for: itself, or bytes that aren't UTF-8, in Base64.
+std::string bytes_of(const nlohmann::json& text)
+{
+    if (text.is_string()) {
+        return text.get<std::string>();
+    }
+    const std::string digits = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
+    std::string bytes;
+    std::size_t bits = 0;
+    int held = 0;
+    for (const char c : text["base64"].get<std::string>()) {
+        if (c != '=') {
+            bits = bits << 6 | digits.find(c);
+            held += 6;
+        }
+        if (held >= 8) {
+            held -= 8;
+            bytes += static_cast<char>(bits >> held);
+        }
+    }
+    return bytes;
+}
+
 }  // namespace
 
 TEST(SchemaPrint, WhatIsPrintedSaysWhatWasSaidAndLoadsToTheSamePrint)
@@ -127,14 +150,13 @@ TEST(SchemaPrint, JsonHoldsTheSameTexts)
     const auto parsed = nlohmann::json::parse(schema.run("print", {"--json"}).out);
     std::string texts;
     for (const auto& definition : parsed["definitions"]) {
-        texts += definition["text"].get<std::string>() + "\n";
+        texts += bytes_of(definition["text"]) + "\n";
     }
     std::string expected;
     for (const char* keyword :
          {"ldapSyntaxes", "matchingRules", "attributeTypes", "XANattributeTypes", "objectClasses"}) {
         expected += section(schema.run("print").out, keyword);
     }
-    const std::size_t bad_bytes = expected.find("\xff\xfe");
-    ASSERT_NE(bad_bytes, std::string::npos);
-    EXPECT_EQ(texts, expected.replace(bad_bytes, 2, "\xef\xbf\xbd\xef\xbf\xbd"));
+    ASSERT_NE(expected.find("\xff\xfe"), std::string::npos);
+    EXPECT_EQ(texts, expected);
 }

@@ -17,13 +17,19 @@ TEST(ToolValue, EachValueHasItsAnswer)
         const char* out;
     } cases[] = {
         {{"commonName", "M\u00FCller  x", ""}, 0, "M\u00DCLLER  X\n\n"},
-        {{"member", "CN=a , O=b", "foo=x"}, 1, "CN=A,O=B\nrefused    17 undefinedAttributeType\n"},
+        {{"member", "CN=a , O=b", "foo=x"},
+         1,
+         "CN=A,O=B\nrefused    17 undefinedAttributeType at byte 0: the schema has no such attribute type\n"},
         {{arc + "24", "20240101003000+0100", "2024"},
          1,
-         "2023-12-31T23:30:00.000000000Z\nrefused    21 invalidAttributeSyntax\n"},
+         "2023-12-31T23:30:00.000000000Z\n"
+         "refused    21 invalidAttributeSyntax: the value is no time of the form "
+         "YYYYMMDDHHMMSS[.F](Z|+HHMM|-HHMM)\n"},
         {{arc + "27", "007", "-5"}, 0, "7\n-5\n"},
         {{arc + "7", "true"}, 0, "TRUE\n"},
-        {{arc + "6", "'01'B", "'2'B"}, 1, "01\nrefused    21 invalidAttributeSyntax\n"},
+        {{arc + "6", "'01'B", "'2'B"},
+         1,
+         "01\nrefused    21 invalidAttributeSyntax: the value is no bit string of the form '0101'B\n"},
         {{arc + "40", "as it is"}, 0, "as it is\n"},
         {{"nonesuch", "x"}, 2, ""},
     };
@@ -36,4 +42,8 @@ TEST(ToolValue, EachValueHasItsAnswer)
     }
     const auto shown = nlohmann::json::parse(run_tool({"value", "normalize", "--json", "cn", "a"}).out);
     EXPECT_EQ(shown["values"][0]["normal"], "A");
+    const auto refused = nlohmann::json::parse(run_tool({"value", "normalize", "--json", "member", "cn=\xff"}).out);
+    EXPECT_EQ(refused["values"][0],
+              nlohmann::json::parse(R"({"value": {"base64": "Y249/w=="}, "ok": false, "result": 34,
+                                        "name": "invalidDNSyntax", "reason": "a value isn't UTF-8"})"));
 }
