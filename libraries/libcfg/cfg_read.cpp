@@ -49,7 +49,7 @@ cfg_failure read_all(const char* path, wiped_text& text)
         return {LDAP_LOCAL_ERROR, "it is no regular file"};
     }
     // A file of the shortest entries takes some twenty times its length in memory.
-    constexpr std::size_t longest = 16 * 1024 * 1024;
+    constexpr std::size_t longest = std::size_t{16} * 1024 * 1024;
     constexpr std::size_t step = 65536;
     text.reserve(std::min(static_cast<std::size_t>(status.st_size), longest) + step);
     for (;;) {

@@ -53,16 +53,14 @@ public:
             } else if (c == '"') {
                 quoted_ = !quoted_;
                 put(c);
-            } else if (quoted_) {
-                put(c);
-            } else if (is_blank(c)) {
+            } else if (!quoted_ && is_blank(c)) {
                 blanks_ += c;
             } else if (c == '=' && !in_value_) {
                 if (!separator(c, !at_start_)) {
                     return false;
                 }
                 in_value_ = true;
-            } else if (c == '+' || c == ',' || c == ';') {
+            } else if (!quoted_ && (c == '+' || c == ',' || c == ';')) {
                 if (!separator(c, in_value_)) {
                     return false;
                 }

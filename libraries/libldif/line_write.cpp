@@ -90,7 +90,7 @@ char* into_new_text(const char* type, std::size_t length, Write&& write)
 
 char* ldif_write_special(char* out, std::size_t used, const char* value, std::size_t length)
 {
-    if (length == 0) {
+    if (length == 0 || value == nullptr) {
         *out = '\n';
         return out + 1;
     }

@@ -104,7 +104,9 @@ inline bool ldif_is_first(char c)
 
 inline char* ldif_write_colon(char* behind_type)
 {
-    std::memcpy(behind_type, ": ", 2);
+    // NOLINTNEXTLINE(clang-analyzer-core.NullDereference): a position in a buffer, which callers have
+    behind_type[0] = ':';
+    behind_type[1] = ' ';
     return behind_type + 2;
 }
 
@@ -117,7 +119,7 @@ char* ldif_write_special(char* out, std::size_t used, const char* value, std::si
 // The same, with the frequent case inline.
 inline char* ldif_write_value(char* out, std::size_t used, const char* value, std::size_t length)
 {
-    if (length != 0 && used + length <= std::size_t{ldif_column_limit} && ldif_is_first(*value) &&
+    if (length != 0 && value != nullptr && used + length <= std::size_t{ldif_column_limit} && ldif_is_first(*value) &&
         ldif_copy(out, value, length)) {
         out[length] = '\n';
         return out + length + 1;

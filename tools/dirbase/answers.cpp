@@ -1,8 +1,7 @@
 // Answers to a list of questions: see answers.h.
 #include "tools/dirbase/answers.h"
 
-#include <new>
-
+#include "tools/dirbase/current_failure.h"
 #include "tools/dirbase/text_file.h"
 
 namespace dirbase_tool {
@@ -68,15 +67,6 @@ int answer_each(const common_options& common, const answer_form& form, const std
                 const std::function<answer(const std::string&)>& ask)
 {
     answer_writer out(common.as_json, form);
-    const auto fail = [&](const tool_failure& failure) {
-        if (!common.as_json) {
-            out.flush();
-            throw failure;
-        }
-        tell(failure.message());
-        out.finish(&failure);
-        return failure.status();
-    };
     try {
         if (form.takes_lines) {
             for_each_line_or_argument(
@@ -88,10 +78,15 @@ int answer_each(const common_options& common, const answer_form& form, const std
         }
     } catch (const output_failure&) {
         throw;
-    } catch (const tool_failure& failure) {
-        return fail(failure);
-    } catch (const std::bad_alloc&) {
-        return fail(tool_failure(status_unusable, "", 0, "not enough memory"));
+    } catch (...) {
+        if (!common.as_json) {
+            out.flush();
+            throw;
+        }
+        const tool_failure failure = current_failure();
+        tell(failure.message());
+        out.finish(&failure);
+        return failure.status();
     }
     out.finish(nullptr);
     return out.all_good() ? status_yes : status_findings;

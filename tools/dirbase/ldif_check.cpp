@@ -235,8 +235,8 @@ std::string findings::summary() const
             const ldif_fault_words& words = words_of(static_cast<ldif_fault_kind>(i));
             const std::string count = std::to_string(found_.counts[i]);
             const std::string name = words.name;
-            text += std::string(count.size() < 8 ? 8 - count.size() : 0, ' ') + count + "  " + name +
-                    std::string(name.size() < 21 ? 21 - name.size() : 1, ' ') + words.meaning + "\n";
+            text.append(count.size() < 8 ? 8 - count.size() : 0, ' ').append(count).append("  ").append(name);
+            text.append(name.size() < 21 ? 21 - name.size() : 1, ' ').append(words.meaning).append("\n");
         }
     }
     return text;

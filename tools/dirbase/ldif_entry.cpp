@@ -405,7 +405,7 @@ entry_pointer new_entry(const ldif_text& text, ldif_fault_list& faults)
         faults.add(kind::nul_byte, dn->line, "dn", "the DN holds a byte 0");
         return entry;
     }
-    if (value_of(*dn).find_first_not_of(" ") == std::string_view::npos) {
+    if (value_of(*dn).find_first_not_of(' ') == std::string_view::npos) {
         faults.add(kind::bad_dn, dn->line, "dn", "the empty DN, which is no entry's");
         return entry;
     }

@@ -278,7 +278,7 @@ void batch_searcher::write(const Entry& entry, std::string& text)
 // What a failure to evaluate comes from.
 std::string words_of_failure(int result)
 {
-    const std::string words = ldap_err2string(result);
+    std::string words = ldap_err2string(result);
     switch (result) {
     case LDAP_OPERATIONS_ERROR: return words + " (most likely the pieces of a substring filter, which are too long)";
     case LDAP_FILTER_ERROR: return words + " (the attribute's syntax lacks the comparison)";

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <iterator>
 #include <sstream>
 #include <string_view>
 
@@ -303,13 +304,11 @@ bool asks_for_json(int argc, char** argv)
 // Using such a stream fails as before: what stands in its place is open for the other direction.
 bool fill_standard_streams()
 {
-    for (const int handle : {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO}) {
-        const bool is_closed = ::fcntl(handle, F_GETFD) < 0 && errno == EBADF;
-        if (is_closed && ::open("/dev/null", handle == STDIN_FILENO ? O_WRONLY : O_RDONLY) != handle) {
-            return false;
-        }
-    }
-    return true;
+    constexpr int handles[] = {STDIN_FILENO, STDOUT_FILENO, STDERR_FILENO};
+    return std::all_of(std::begin(handles), std::end(handles), [](int handle) {
+        const bool is_open = ::fcntl(handle, F_GETFD) >= 0 || errno != EBADF;
+        return is_open || ::open("/dev/null", handle == STDIN_FILENO ? O_WRONLY : O_RDONLY) == handle;
+    });
 }
 
 int main_of_tool(int argc, char** argv)

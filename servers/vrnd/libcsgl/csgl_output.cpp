@@ -11,8 +11,8 @@ constexpr char hex_digits[] = "0123456789abcdef";
 template <typename Number>
 csgl_output& put_number(csgl_output& output, Number value)
 {
-    char text[24];  // a 64-bit number has at most 20 characters
-    *std::to_chars(text, text + sizeof(text) - 1, value).ptr = '\0';
+    char text[24] = {};  // a 64-bit number has at most 20 characters
+    std::to_chars(text, text + sizeof(text) - 1, value);
     return output << text;
 }
 

@@ -12,6 +12,7 @@
 #include <cstdint>
 #include <functional>
 #include <new>
+#include <utility>
 
 #include "libraries/dirbase_export.h"
 #include "servers/vrnd/libcsgl/csgl_memory.h"
@@ -80,23 +81,9 @@ public:
     ~csgl_refcounted_pointer_to() { drop(body_); }
 
     // The new reference is taken before the old one is dropped, so that a handle may be assigned to itself.
-    csgl_refcounted_pointer_to& operator=(const csgl_refcounted_pointer_to& other)
+    csgl_refcounted_pointer_to& operator=(csgl_refcounted_pointer_to other) noexcept
     {
-        T* old = body_;
-        body_ = other.body_;
-        take();
-        drop(old);
-        return *this;
-    }
-
-    csgl_refcounted_pointer_to& operator=(csgl_refcounted_pointer_to&& other) noexcept
-    {
-        if (this != &other) {
-            T* old = body_;
-            body_ = other.body_;
-            other.body_ = nullptr;
-            drop(old);
-        }
+        std::swap(body_, other.body_);
         return *this;
     }
 

@@ -39,7 +39,7 @@ public:
     {
         ber_len_t length = 0;
         const ber_tag_t tag = ber_peek_tag(ber, &length);
-        entered_ = tag != LBER_ERROR && (tag & constructed) != 0;
+        entered_ = ber != nullptr && tag != LBER_ERROR && (tag & constructed) != 0;
         if (entered_) {
             ber_skip_tag(ber, &length);
             ber_->ber_end = ber_->ber_ptr + length;

@@ -108,6 +108,7 @@ public:
                 end = end_;
                 continue;
             }
+            // NOLINTNEXTLINE(clang-analyzer-core.NonNullParamChecker): there is room, so there is a buffer
             std::memcpy(at, name, named_attribute::unit);
             if (name_length > named_attribute::unit) {
                 std::memcpy(at + named_attribute::unit, name + named_attribute::unit,
@@ -124,6 +125,7 @@ public:
         if (plenty(2, dn.size()) > left() && !make_room(ldif_line_room(2, dn.size()))) {
             return false;
         }
+        // NOLINTNEXTLINE(clang-analyzer-core.NonNullParamChecker): there is room, so there is a buffer
         std::memcpy(at_, "dn: ", 4);
         at_ = ldif_write_value(at_ + 4, 4, dn.data(), dn.size());
         return true;

@@ -42,7 +42,7 @@ constexpr std::size_t pattern_space = 1022;
 
 std::string_view text_of(const berval& value)
 {
-    return value.bv_val == nullptr ? std::string_view("", 0)
+    return value.bv_val == nullptr ? std::string_view("")
                                    : std::string_view(value.bv_val, strnlen(value.bv_val, value.bv_len));
 }
 

@@ -194,7 +194,7 @@ ldcf_matchrule ldcf_attrtype_::resolve_rule(const char* keyword, csgl_string& ru
     if (rule.empty()) {
         return {};
     }
-    const ldcf_matchrule found = ldcf_find(rules, rule);
+    ldcf_matchrule found = ldcf_find(rules, rule);
     if (!found) {
         LDCF_THROW_INPUT(("[p[", keyword, " " LDCF_KIND_MATCHING_RULE "]p] ", ldcf_quoted_parameter(rule),
                           " not found when processing [p[" LDCF_KIND_ATTRIBUTE_TYPE "]p] ",

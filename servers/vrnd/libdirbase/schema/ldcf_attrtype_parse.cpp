@@ -271,7 +271,7 @@ namespace {
 
 csgl_string check_oid(ldcf_token_factory& factory)
 {
-    ldcf_token(factory, LDCF_EXPECTED("'('"), token_left_paren, LDCF_MSG_EXPECTED);
+    [[maybe_unused]] const ldcf_token opening(factory, LDCF_EXPECTED("'('"), token_left_paren, LDCF_MSG_EXPECTED);
     return ldcf_stream::oid(factory);
 }
 

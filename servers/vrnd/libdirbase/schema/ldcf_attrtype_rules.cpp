@@ -1,5 +1,8 @@
 // Which matching rules suit which syntax: a table of families, and a rule of its own for texts, whose rules must agree
 // about case.
+#include <algorithm>
+#include <iterator>
+
 #include "libraries/libmsg/debug_log.h"
 #include "libraries/libmsg/message_log.h"
 #include "servers/vrnd/libdirbase/schema/ldcf_attrtype.h"
@@ -92,22 +95,15 @@ constexpr rule_list ignoring_ordering{{&ldcf_rule_case_ignore_ordering}};
 
 bool holds(const oid_list& list, const csgl_string& oid)
 {
-    for (const char* candidate : list) {
-        if (candidate != nullptr && oid == candidate) {
-            return true;
-        }
-    }
-    return false;
+    return std::any_of(std::begin(list), std::end(list),
+                       [&](const char* candidate) { return candidate != nullptr && oid == candidate; });
 }
 
 bool holds(const rule_list& list, const csgl_string& rule)
 {
-    for (const ldcf_known_rule* candidate : list.rules) {
-        if (candidate != nullptr && (rule == candidate->oid || rule == candidate->name)) {
-            return true;
-        }
-    }
-    return false;
+    return std::any_of(std::begin(list.rules), std::end(list.rules), [&](const ldcf_known_rule* candidate) {
+        return candidate != nullptr && (rule == candidate->oid || rule == candidate->name);
+    });
 }
 
 bool empty_or_in(const rule_list& list, const csgl_string& rule)

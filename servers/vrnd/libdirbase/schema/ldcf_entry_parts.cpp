@@ -35,7 +35,7 @@ ldcf_type_pointer ldcf_type_named(const ldcf_schema& schema, const char* name)
         const std::size_t length = std::strlen(name);
         const ldcf_hash_tbl_entry* node = ldcf_find_node(name, length);
         if (node != nullptr && node->info != nullptr && node->info->type != nullptr &&
-            std::memchr(name, folds_to_underscore, length) == nullptr) {
+            std::strchr(name, folds_to_underscore) == nullptr) {
             return node->info->type;
         }
     }

@@ -49,7 +49,7 @@ public:
 
 private:
     static constexpr std::size_t line = 64;
-    static constexpr std::size_t piece_size = 64 * 1024;
+    static constexpr std::size_t piece_size = std::size_t{64} * 1024;
 
     struct piece {
         piece* before;

@@ -56,7 +56,7 @@ void ldcf_matchrule_::incomplete()
 
 void ldcf_matchrule::parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_matchrule>& map)
 {
-    ldcf_token(factory, LDCF_EXPECTED("'('"), token_left_paren, LDCF_MSG_EXPECTED);
+    [[maybe_unused]] const ldcf_token opening(factory, LDCF_EXPECTED("'('"), token_left_paren, LDCF_MSG_EXPECTED);
     const csgl_string oid = ldcf_stream::oid(factory);
     if (map.count(oid) != 0) {
         factory.throw_exc(

@@ -83,7 +83,7 @@ void ldcf_objclass::parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_
     constexpr char with_end[] = LDCF_EXPECTED_ONE_OF(OBJCLASS_KEYWORDS " ')'");
     constexpr unsigned mask = token_descr | token_right_paren;
 
-    ldcf_token(factory, LDCF_EXPECTED("'('"), token_left_paren, LDCF_MSG_EXPECTED);
+    [[maybe_unused]] const ldcf_token opening(factory, LDCF_EXPECTED("'('"), token_left_paren, LDCF_MSG_EXPECTED);
     const csgl_string oid = ldcf_stream::oid(factory);
     if (map.count(oid) != 0) {
         throw_duplicate(factory, oid);

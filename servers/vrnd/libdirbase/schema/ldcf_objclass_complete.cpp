@@ -9,7 +9,7 @@ template <typename T>
 T find_reference(const ldcf_map_name_to<T>& map, const csgl_string& text, const char* kind,
                  const csgl_string& class_name)
 {
-    const T found = ldcf_find(map, text);
+    T found = ldcf_find(map, text);
     if (!found) {
         LDCF_THROW_INPUT(("[p[", kind, "]p] ", ldcf_quoted_parameter(text),
                           " not found when processing [p[" LDCF_KIND_OBJECT_CLASS "]p] ",

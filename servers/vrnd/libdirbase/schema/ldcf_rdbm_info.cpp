@@ -178,7 +178,7 @@ private:
         if (text == nullptr || add(&info_.names, text.get()) != 0) {
             return false;
         }
-        text.release();
+        static_cast<void>(text.release());
         return true;
     }
 
@@ -352,7 +352,7 @@ bool add_class_name(objectclassinfo& info, const csgl_string& name)
         debug_error("ldcf_rdbm::fill_classinfo-- charray_add failed!\n");
         return false;
     }
-    text.release();
+    static_cast<void>(text.release());
     return true;
 }
 

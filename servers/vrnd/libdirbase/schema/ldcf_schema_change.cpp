@@ -100,7 +100,7 @@ void leave_relatives(const ldcf_objclass& objclass)
 template <typename T>
 T find_for_erase(const ldcf_map_name_to<T>& map, const T& given)
 {
-    const T found = ldcf_find(map, given.oid());
+    T found = ldcf_find(map, given.oid());
     if (!found) {
         throw_does_not_exist(ldcf_kind_of(given), given.oid(), LDCF_MSG_DELETE_NOT_THERE);
     }
@@ -121,7 +121,7 @@ T find_for_erase(const ldcf_map_name_to<T>& map, const T& given)
 template <typename T>
 T erase_from(ldcf_map_name_to<T>& map, const T& given)
 {
-    const T found = find_for_erase(map, given);
+    T found = find_for_erase(map, given);
     const ldcf_names& names = found->names();
     const int expected = 2 + static_cast<int>(names.size()) + relatives(found) - shared_keys(found);
     const int count = found->value();

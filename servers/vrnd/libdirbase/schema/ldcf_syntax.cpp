@@ -34,7 +34,7 @@ void ldcf_syntax::parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_sy
 {
     constexpr char expected[] = LDCF_EXPECTED_ONE_OF("'DESC' ')'");
 
-    ldcf_token(factory, LDCF_EXPECTED("'('"), token_left_paren, LDCF_MSG_EXPECTED);
+    [[maybe_unused]] const ldcf_token opening(factory, LDCF_EXPECTED("'('"), token_left_paren, LDCF_MSG_EXPECTED);
     const csgl_string oid = ldcf_stream::oid(factory);
     if (map.count(oid) != 0) {
         factory.throw_exc(ldcf_join("duplicate definition of [p[" LDCF_KIND_SYNTAX "]p] ", ldcf_quoted_parameter(oid)),
@@ -46,7 +46,7 @@ void ldcf_syntax::parse_v3(ldcf_token_factory& factory, ldcf_map_name_to<ldcf_sy
     const ldcf_token token(factory, expected, token_descr | token_right_paren, LDCF_MSG_EXPECTED_ONE_OF);
     if (token.is("DESC")) {
         syntax->description_ = ldcf_stream::qdstring(factory);
-        ldcf_token(factory, LDCF_EXPECTED("')'"), token_right_paren, LDCF_MSG_EXPECTED);
+        [[maybe_unused]] const ldcf_token closing(factory, LDCF_EXPECTED("')'"), token_right_paren, LDCF_MSG_EXPECTED);
     } else if (!token[token_right_paren]) {
         factory.throw_exc(expected, LDCF_MSG_EXPECTED_ONE_OF);
     }
