@@ -5,13 +5,11 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <algorithm>
 #include <cstddef>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <memory>
-#include <string_view>
 #include <utility>
 
 #include "libraries/libldif/line64.h"
@@ -144,9 +142,9 @@ bool unescape(char* text)
 
 // Whether an OID can stand in a line: one with a blank or a colon would read back as another control, and one with a
 // line end would add a line of its sender's choice.
-bool is_one_word(std::string_view oid)
+bool is_one_word(const char* oid)
 {
-    return std::all_of(oid.begin(), oid.end(), [](char c) { return c > ' ' && c < 0x7f && c != ':'; });
+    return std::strpbrk(oid, word_ends) == nullptr;
 }
 
 // A regular file, opened for reading. Anything else (a pipe would wait for a writer) is null with errno set.

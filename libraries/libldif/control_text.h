@@ -31,8 +31,8 @@ DIRBASE_C_BEGIN
 DIRBASE_EXPORT LDAPControl* string2control(const char* line, int* is_base64, int* is_url);
 
 // The text of a control, new, for the caller to free(): with a value a line with its line feed, without one a line that
-// lacks it. Null for a null control; for one whose OID is missing or holds a blank, a colon, a control character or a
-// byte outside ASCII; and without memory.
+// lacks it. Null for a null control; for one whose OID is missing or holds a space, a colon or a line end; and without
+// memory.
 DIRBASE_EXPORT char* control2string(const LDAPControl* control);
 
 // Appends the controls that stand in a text, each from one "control" to the next.

@@ -95,7 +95,9 @@ char* ldif_remove_folds(char* text, char* end)
 int ldif_split_line(char* line, char* end, int mode, bool marked, ldif_parts& parts)
 {
     parts = {};
-    while (is_white_space(*line)) {
+    // Markers fall away, so blanks at the ends of the type are looked for beyond them, too.
+    const auto is_marker = [marked](char c) { return marked && c == ldif_fold_marker; };
+    while (is_white_space(*line) || is_marker(*line)) {
         ++line;
     }
     auto* const colon = static_cast<char*>(std::memchr(line, ':', static_cast<std::size_t>(end - line)));
@@ -104,7 +106,7 @@ int ldif_split_line(char* line, char* end, int mode, bool marked, ldif_parts& pa
         return LDIF_LINE_BAD;
     }
     char* type_end = colon;
-    while (type_end > line && type_end[-1] == ' ') {
+    while (type_end > line && (type_end[-1] == ' ' || is_marker(type_end[-1]))) {
         --type_end;
     }
     *type_end = '\0';

@@ -163,6 +163,7 @@ TEST(Line64, LinesPartIntoTypeAndValue)
         {"cn:\x01\x01: YQ==", "cn|: YQ==", nullptr, nullptr},
         {"cn:\n  b", "cn| b", nullptr, nullptr},
         {"cn:\x01\x01", "cn|", nullptr, nullptr},
+        {"\x01 cn \x01 \x01: a", "cn|a", nullptr, nullptr},
         {"cn:  a ", "cn| a ", "cn|a ", "cn|a"},
         {" \tcn  :a\t\r", "cn|a\t\r", nullptr, "cn|a"},
         {"cn:\ta", "cn|\ta", nullptr, nullptr},
