@@ -12,10 +12,11 @@
 //   - "+" joins pairs and "," RDNs, without blanks.
 //
 // So the canonical text normalises to itself, unless escapes have made it longer than dn_longest or a first name holds
-// other characters than letters, digits and hyphens. That is why a DN is refused whose canonical text would end in an
-// empty value ("cn=", "cn=," or a pair of quotes). A byte 0 written as a hexadecimal pair is refused because texts end
-// there. In values that are folded to upper case, so is everything that utfToUpper refuses: bytes that aren't UTF-8,
-// and characters above U+FFFF; and so are characters in more bytes than they take.
+// other characters than letters, digits and hyphens. That is why a DN is refused that would end in an empty value,
+// in the order of its pairs as written or as sorted ("cn=", "cn=,", a pair of quotes, "sn=a+cn=,"). A byte 0 written as
+// a hexadecimal pair is refused because texts end there. In values that are folded to upper case, so is everything that
+// utfToUpper refuses: bytes that aren't UTF-8, and characters above U+FFFF; and so are characters in more bytes than
+// they take.
 //
 // The upper text is made of the canonical one, in whose order it stays. So where an RDN has one type twice, which
 // X.501 forbids, the order of its pairs may depend on the case of letters outside ASCII, and pairs of a case-exact type

@@ -228,8 +228,10 @@ int parse_rdns(const char* text, ldap_escDN*& dn, std::size_t room, int order, i
             ++at;
         }
     }
-    dn->scratch[work.length - 1] = '\0';
-    return dn->last->last->rdn->value_length == 0 ? DN_ERR_EMPTY_VALUE : 0;
+    char* const end = dn->scratch + work.length - 1;
+    *end = '\0';
+    const bool written_so = end[-1] == '=' && end[-2] != '\\';
+    return written_so || dn->last->last->rdn->value_length == 0 ? DN_ERR_EMPTY_VALUE : 0;
 }
 
 ldap_escDN* normalize(const char* text, int schema)
