@@ -6,7 +6,8 @@
 #
 # parse_str_fuzz gets one definition of each shape (the sequence of its keywords), with the extended one that belongs to
 # it. token_fuzz gets the beginnings of some files, stream_fuzz one text for each reader, time_fuzz one for each form,
-# the fuzzers of DNs a DN a line, and cfg_fuzz configurations, each behind a base and a filter.
+# the fuzzers of DNs a DN a line, and cfg_fuzz configurations, each behind a base and a filter. What fuzz/minimise.sh kept
+# in their folders goes, and is chosen again by its next run.
 set -euo pipefail
 cd "$(dirname "$0")"
 schema=../share/schema
