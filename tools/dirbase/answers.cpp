@@ -18,7 +18,7 @@ public:
         held_ = as_json_ ? std::string("{\n  \"") + form_.list + "\": [" : "";
     }
 
-    bool all_good() const { return all_good_; }
+    int status() const { return all_good_ ? status_yes : status_findings; }
 
     void put(const answer& given)
     {
@@ -67,7 +67,7 @@ int answer_each(const common_options& common, const answer_form& form, const std
                 const std::function<answer(const std::string&)>& ask)
 {
     answer_writer out(common.as_json, form);
-    try {
+    const auto answer_all = [&] {
         if (form.takes_lines) {
             for_each_line_or_argument(
                 questions, [&](const std::string& question) { out.put(ask(question)); }, [&] { out.flush(); });
@@ -76,20 +76,17 @@ int answer_each(const common_options& common, const answer_form& form, const std
                 out.put(ask(question));
             }
         }
-    } catch (const output_failure&) {
-        throw;
-    } catch (...) {
-        if (!common.as_json) {
-            out.flush();
+    };
+    return write_results(common.as_json, out, [&] {
+        try {
+            answer_all();
+        } catch (const output_failure&) {
+            throw;
+        } catch (...) {
+            out.flush();  // the answers ahead of what failed
             throw;
         }
-        const tool_failure failure = current_failure();
-        tell(failure.message());
-        out.finish(&failure);
-        return failure.status();
-    }
-    out.finish(nullptr);
-    return out.all_good() ? status_yes : status_findings;
+    });
 }
 
 }  // namespace dirbase_tool
